@@ -1,0 +1,3 @@
+#include "qorv_prf_extraction.h"
+
+void fdfExtractPrfChanges(const char* /*theInput*/) {}

@@ -1,0 +1,160 @@
+#include "qorv_generic_utility.h"
+
+#include <strings.h>
+#include <sys/stat.h>
+
+#include <cerrno>
+#include <cstdarg>
+#include <cstdio>
+#include <cstdlib>
+#include <cstring>
+#include <fstream>
+
+void QorvFreeDeleter::operator()(char* p) const noexcept { std::free(p); }
+
+namespace {
+
+/// Length of `a` up to its first carriage return.
+std::size_t lengthToCarriageReturn(const char* a)
+{
+    const char* aCr = std::strchr(a, '\r');
+    return aCr ? static_cast<std::size_t>(aCr - a) : std::strlen(a);
+}
+
+char* allocateText(std::size_t theLength)
+{
+    char* aText = static_cast<char*>(std::malloc(theLength + 1));
+    if (aText) aText[theLength] = '\0';
+    return aText;
+}
+
+}  // namespace
+
+char* fqorvStrDup(const char* a)
+{
+    if (!a) return nullptr;
+    const std::size_t aLen = lengthToCarriageReturn(a);
+    char* aText = allocateText(aLen);
+    if (aText) std::memcpy(aText, a, aLen);
+    return aText;
+}
+
+char* fqorvStrCat(const char* a, const char* b)
+{
+    if (!a) return nullptr;
+    if (!b) b = "";
+    const std::size_t aLenA = std::strlen(a), aLenB = std::strlen(b);
+    char* aText = allocateText(aLenA + aLenB);
+    if (!aText) return nullptr;
+    std::memcpy(aText, a, aLenA);
+    std::memcpy(aText + aLenA, b, aLenB);
+    if (char* aCr = std::strchr(aText, '\r')) *aCr = '\0';
+    return aText;
+}
+
+char* fqorvStrCatFree(char* a, const char* b)
+{
+    char* aText = fqorvStrCat(a, b);
+    std::free(a);
+    return aText;
+}
+
+char* fqorvJoin(const char* a, const char* b)
+{
+    if (!a) return nullptr;
+    return fqorvFormat("%s_%s", a, b ? b : "");
+}
+
+char* fqorvFormat(const char* format, ...)
+{
+    if (!format) return nullptr;
+    va_list aArgs;
+    va_start(aArgs, format);
+    char* aText = nullptr;
+    if (vasprintf(&aText, format, aArgs) < 0) aText = nullptr;
+    va_end(aArgs);
+    return aText;
+}
+
+std::string fqorvStringFormat(const char* format, ...)
+{
+    va_list aArgs;
+    va_start(aArgs, format);
+    char* aText = nullptr;
+    const int aLen = vasprintf(&aText, format, aArgs);
+    va_end(aArgs);
+    if (aLen < 0) return std::string();
+    std::string aResult(aText, static_cast<std::size_t>(aLen));
+    std::free(aText);
+    return aResult;
+}
+
+bool fqorvEndsWith(const char* a, const char* b)
+{
+    if (!a || !b) return false;
+    const std::size_t aLenA = std::strlen(a), aLenB = std::strlen(b);
+    if (aLenA <= aLenB) return false;
+    const char* aTail = a + (aLenA - aLenB);
+    return std::strcmp(aTail, b) == 0 || strcasecmp(aTail, b) == 0;
+}
+
+bool fqorvEndsWith(const std::string& a, const std::string& b) { return fqorvEndsWith(a.c_str(), b.c_str()); }
+
+bool fqorvCutSuffix(char* a, const char* b)
+{
+    if (!fqorvEndsWith(a, b)) return false;
+    a[std::strlen(a) - std::strlen(b)] = '\0';
+    return true;
+}
+
+std::string fqorvCutSuffix(std::string a, const std::string& b)
+{
+    if (fqorvEndsWith(a, b)) a.resize(a.size() - b.size());
+    return a;
+}
+
+bool fqorvFileExists(const char* a)
+{
+    if (!a || !*a || std::strstr(a, "NotOK")) return false;
+    struct stat aStat {};
+    const bool aExists = ::stat(a, &aStat) == 0;
+    errno = 0;  // the lookup's error is not a failure of the caller
+    return aExists;
+}
+
+bool fqorvReadTextLines(const char* thePath, std::vector<std::string>& theLines)
+{
+    theLines.clear();
+    if (!thePath) return false;
+    std::ifstream aIn(thePath, std::ios::binary);
+    if (!aIn) return false;
+    constexpr std::size_t aLimit = 10000;
+    std::string aLine;
+    while (std::getline(aIn, aLine)) {
+        if (aLine.size() > aLimit) aLine.resize(aLimit);
+        // A carriage return ends the line where it stands.
+        const std::size_t aCr = aLine.find('\r');
+        if (aCr != std::string::npos) aLine.resize(aCr);
+        const std::size_t aFirst = aLine.find_first_not_of(' ');
+        if (aFirst == std::string::npos) {
+            aLine.clear();
+        } else {
+            const std::size_t aLast = aLine.find_last_not_of(' ');
+            aLine = aLine.substr(aFirst, aLast - aFirst + 1);
+        }
+        if (!aLine.empty() && aLine[0] == '#') break;
+        theLines.push_back(aLine);
+    }
+    return true;
+}
+
+namespace NQORV_UTILITY {
+
+long largestPowerOfTwo(long n)
+{
+    long p = 1;
+    while (p <= n / 2) p *= 2;
+    return p;
+}
+
+}  // namespace NQORV_UTILITY
