@@ -1,0 +1,121 @@
+// The driver program run as a real process: exit status, result files, working file, trace, log.
+#include <gtest/gtest.h>
+
+#include "qorv_errors.h"
+#include "qorvex_test_support.h"
+
+namespace {
+
+using qtest::DriverSandbox;
+using qtest::RunResult;
+
+/// The working file after a failure: -1, the title, the texts, the id in the secondary line.
+void expectFailureReported(const DriverSandbox& theBox, const RunResult& theRun, int theId)
+{
+    EXPECT_EQ(theRun.mExitId, theId) << theRun.mStderr;
+    EXPECT_EQ(theRun.mStatus, fqorvExitStatus(theId));
+    EXPECT_NE(theRun.mStatus, 0);
+    const auto aWorking = qtest::readLines(theBox.workingFile());
+    ASSERT_GE(aWorking.size(), 4u);
+    EXPECT_EQ(aWorking[0], "-1");
+    EXPECT_NE(aWorking[3].find("[EC : " + std::to_string(theId) + "]"), std::string::npos) << aWorking[3];
+    EXPECT_EQ(qtest::readLines(theBox.workingFile().string() + "_error").at(0), "-1");
+}
+
+TEST(DriverProcess, MissingOrShortArgumentsFile)
+{
+    DriverSandbox aBox;
+    RunResult aRun = aBox.run(aBox.data() / "no_such_args.txt");
+    expectFailureReported(aBox, aRun, 261122);
+    EXPECT_NE(qtest::readLines(aBox.workingFile())[4].find("no_such_args.txt"), std::string::npos);
+
+    qtest::writeFile(aBox.data() / "one_line.txt", "only a comment line\n");
+    expectFailureReported(aBox, aBox.run(aBox.data() / "one_line.txt"), 261122);
+}
+
+TEST(DriverProcess, FewerThanNineteenArgumentsAlsoWhenAHashLineCutsThem)
+{
+    DriverSandbox aBox;
+    auto aArgs = DriverSandbox::defaultArguments(aBox.data() / "raw", aBox.data() / "x_slc");
+    aArgs.resize(18);
+    expectFailureReported(aBox, aBox.run(aBox.writeArguments(aArgs)), 456962);
+
+    auto aCut = DriverSandbox::defaultArguments(aBox.data() / "raw", aBox.data() / "x_slc");
+    aCut.insert(aCut.begin() + 10, "# everything from here on is ignored");
+    expectFailureReported(aBox, aBox.run(aBox.writeArguments(aCut, "cut.txt")), 456962);
+}
+
+TEST(DriverProcess, EnvironmentFailuresKeepTheirIds)
+{
+    DriverSandbox aBox;
+    const auto aArgs = aBox.writeArguments(DriverSandbox::defaultArguments(aBox.data() / "raw", aBox.data() / "x_slc"));
+    // No QORVEX_INIT_DIR: the run can't know its working file; the id still reaches the caller.
+    RunResult aNoInit = qtest::runProgram(qtest::binaryDir() / "qorvex", {aArgs.string()}, {}, aBox.work());
+    EXPECT_EQ(aNoInit.mExitId, 783360);
+    EXPECT_EQ(aNoInit.mStatus, fqorvExitStatus(783360));
+    // With the working file named in the environment, the result files show it.
+    RunResult aNamed = qtest::runProgram(qtest::binaryDir() / "qorvex", {aArgs.string()},
+                                         {{"QORVEX_WORKING_FILE", aBox.workingFile().string()}}, aBox.work());
+    EXPECT_EQ(aNamed.mExitId, 783360);
+    EXPECT_NE(qtest::readFile(aBox.workingFile().string() + "_error").find("[EC : 783360]"), std::string::npos);
+
+    // A configuration of 13 lines.
+    const auto aIni = aBox.etc() / "Qorvex_configuration.ini";
+    const std::string aFull = qtest::readFile(aIni);
+    qtest::writeFile(aIni, aFull.substr(0, aFull.rfind('\n', aFull.size() - 2) + 1));
+    EXPECT_EQ(aBox.run(aArgs).mExitId, 783360);
+}
+
+TEST(DriverProcess, MissingCatalogueIsAMissingFile)
+{
+    qtest::TempDir aDes;
+    qtest::ConfigOptions aOptions;
+    aOptions.mDesDir = aDes.path();
+    DriverSandbox aBox(aOptions);
+    qtest::writeFile(aBox.workingFile(), "0\ncaller\n");
+    const auto aArgs = aBox.writeArguments(DriverSandbox::defaultArguments(aBox.data() / "raw", aBox.data() / "x_slc"));
+    RunResult aRun = aBox.run(aArgs);
+    EXPECT_EQ(aRun.mExitId, 261122);
+    EXPECT_EQ(qtest::readLines(aBox.workingFile()).at(0), "-1");
+    // Without catalogues the texts say so.
+    EXPECT_NE(qtest::readFile(aBox.workingFile()).find("AN ERROR OCCUR DURING Qorvex INIT"), std::string::npos);
+}
+
+TEST(DriverProcess, MissingInputWithArgumentElevenEndsSuccessfully)
+{
+    DriverSandbox aBox;
+    auto aArgs = DriverSandbox::defaultArguments(aBox.data() / "raw_missing", aBox.data() / "x_slc");
+    aArgs[11] = "OK";
+    RunResult aRun = aBox.run(aBox.writeArguments(aArgs));
+    EXPECT_EQ(aRun.mStatus, 0) << aRun.mStderr;
+    EXPECT_EQ(aRun.mExitId, 0);
+    EXPECT_NE(aBox.trace().find("SUCCESSFULL"), std::string::npos);
+    EXPECT_NE(aBox.log().find("\n\nSUCCESSFULL\n\n\n"), std::string::npos);
+    EXPECT_NE(aBox.log().find("\n\nSUCCESSFUL\n\n"), std::string::npos);
+    EXPECT_FALSE(std::filesystem::exists(aBox.workingFile()));
+    EXPECT_FALSE(std::filesystem::exists(aBox.data() / "x_par.sml"));
+}
+
+TEST(DriverProcess, AStepThatIsNotBuiltFailsLoudlyNamingIt)
+{
+    DriverSandbox aBox;
+    auto aArgs = DriverSandbox::defaultArguments(aBox.data() / "raw", aBox.data() / "x_slc");
+    aArgs[14] = "OK";  // skip step 0; step 1 comes first
+    RunResult aRun = aBox.run(aBox.writeArguments(aArgs));
+    expectFailureReported(aBox, aRun, 130560);
+    const std::string aWorking = qtest::readFile(aBox.workingFile());
+    EXPECT_NE(aWorking.find("SAR IQ raw data azimuth spectrum"), std::string::npos) << aWorking;
+    EXPECT_NE(aBox.log().find("[ERROR ID : 130560]"), std::string::npos);
+}
+
+TEST(DriverProcess, AStopInTheWorkingFileEndsTheRunBeforeTheFirstStep)
+{
+    DriverSandbox aBox;
+    qtest::writeFile(aBox.workingFile(), "101\ncaller\n");
+    auto aArgs = DriverSandbox::defaultArguments(aBox.data() / "raw", aBox.data() / "x_slc");
+    aArgs[14] = "OK";
+    expectFailureReported(aBox, aBox.run(aBox.writeArguments(aArgs)), 326400);
+    EXPECT_EQ(qtest::readLines(aBox.workingFile()).at(1), "caller");  // the caller's title line is kept
+}
+
+}  // namespace
