@@ -89,6 +89,7 @@ CChainRun::CChainRun(std::vector<std::string> theArgs, std::vector<std::string> 
     : mArgs(std::move(theArgs)), mFileList(std::move(theFileList))
 {
     if (!mFileList.empty()) mCurrentInput = mFileList.front();
+    mFromList = !mArgs.empty() && fqorvEndsWith(mArgs[0], CQORV_FOC_LIST_SUFFIX);
 }
 
 std::vector<int> CChainRun::stepList() const
@@ -100,7 +101,9 @@ std::vector<int> CChainRun::stepList() const
 void CChainRun::setRoot()
 {
     mCurrentInput = mFileList[static_cast<std::size_t>(mFileIndex)];
-    if (nbrOfFiles() == 1) {
+    // A single input file takes argument 2; the products of a list file, even of a one-line
+    // list, are named from their own file names.
+    if (!mFromList) {
         mRoot = fqorvCutSuffix(arg(2), focus() ? "_slc" : "_pwr");
         mKeepRoot = mRoot;
     } else {

@@ -85,6 +85,7 @@ private:
 
     std::vector<std::string> mArgs;
     std::vector<std::string> mFileList;
+    bool mFromList = false;  // argument 0 is a list file
     std::string mRoot;
     bool mRootSet = false;
     std::string mKeepRoot;
