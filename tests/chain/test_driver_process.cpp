@@ -1,6 +1,10 @@
 // The driver program run as a real process: exit status, result files, working file, trace, log.
 #include <gtest/gtest.h>
 
+#include <memory>
+
+#include "chain_fixtures.h"
+#include "qorv_description_section.h"
 #include "qorv_errors.h"
 #include "qorvex_test_support.h"
 
@@ -8,6 +12,24 @@ namespace {
 
 using qtest::DriverSandbox;
 using qtest::RunResult;
+
+/// Writes a small raw product into the sandbox's data directory.
+std::filesystem::path makeRaw(const DriverSandbox& theBox, const std::string& theName,
+                              const qtest::SmallRawOptions& theOptions = {})
+{
+    qtest::InProcessEnvironment aEnv;
+    const auto aRaw = theBox.data() / theName;
+    qtest::writeSmallRawProduct(aRaw, theOptions);
+    return aRaw;
+}
+
+/// Reads a header written by a run.
+std::unique_ptr<CDescriptionHeader> readHeader(const std::filesystem::path& thePath)
+{
+    auto aHeader = CDescriptionHeader::makeFull();
+    EXPECT_TRUE(aHeader->read(thePath.c_str(), true)) << thePath;
+    return aHeader;
+}
 
 /// The working file after a failure: -1, the title, the texts, the id in the secondary line.
 void expectFailureReported(const DriverSandbox& theBox, const RunResult& theRun, int theId)
@@ -54,6 +76,7 @@ TEST(DriverProcess, EnvironmentFailuresKeepTheirIds)
     EXPECT_EQ(aNoInit.mExitId, 783360);
     EXPECT_EQ(aNoInit.mStatus, fqorvExitStatus(783360));
     // With the working file named in the environment, the result files show it.
+    qtest::writeFile(aBox.workingFile(), "0\ncaller\n");
     RunResult aNamed = qtest::runProgram(qtest::binaryDir() / "qorvex", {aArgs.string()},
                                          {{"QORVEX_WORKING_FILE", aBox.workingFile().string()}}, aBox.work());
     EXPECT_EQ(aNamed.mExitId, 783360);
@@ -99,7 +122,7 @@ TEST(DriverProcess, MissingInputWithArgumentElevenEndsSuccessfully)
 TEST(DriverProcess, AStepThatIsNotBuiltFailsLoudlyNamingIt)
 {
     DriverSandbox aBox;
-    auto aArgs = DriverSandbox::defaultArguments(aBox.data() / "raw", aBox.data() / "x_slc");
+    auto aArgs = DriverSandbox::defaultArguments(makeRaw(aBox, "raw"), aBox.data() / "x_slc");
     aArgs[14] = "OK";  // skip step 0; step 1 comes first
     RunResult aRun = aBox.run(aBox.writeArguments(aArgs));
     expectFailureReported(aBox, aRun, 130560);
@@ -112,10 +135,75 @@ TEST(DriverProcess, AStopInTheWorkingFileEndsTheRunBeforeTheFirstStep)
 {
     DriverSandbox aBox;
     qtest::writeFile(aBox.workingFile(), "101\ncaller\n");
-    auto aArgs = DriverSandbox::defaultArguments(aBox.data() / "raw", aBox.data() / "x_slc");
+    auto aArgs = DriverSandbox::defaultArguments(makeRaw(aBox, "raw"), aBox.data() / "x_slc");
     aArgs[14] = "OK";
     expectFailureReported(aBox, aBox.run(aBox.writeArguments(aArgs)), 326400);
     EXPECT_EQ(qtest::readLines(aBox.workingFile()).at(1), "caller");  // the caller's title line is kept
+}
+
+TEST(DriverProcess, StepZeroMakesTheParameterFileAndTheRunEndsCleanly)
+{
+    DriverSandbox aBox;
+    auto aArgs = DriverSandbox::defaultArguments(makeRaw(aBox, "scene_raw"), aBox.data() / "x_pwr");
+    aArgs[1] = "NotOK";  // only step 0 runs; without focusing "_pwr" is cut from the root
+    RunResult aRun = aBox.run(aBox.writeArguments(aArgs));
+    ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr;
+    EXPECT_EQ(aRun.mExitId, 0);
+    EXPECT_FALSE(std::filesystem::exists(aBox.workingFile()));
+    qtest::InProcessEnvironment aEnv;
+    auto aPar = std::make_unique<CDescriptionHeader>(std::initializer_list<const char*>{"sar_processing"});
+    ASSERT_TRUE(aPar->read((aBox.data() / "x_par").c_str(), true));
+    EXPECT_DOUBLE_EQ((*aPar)["sar_processing.Velocity"].getDouble(), 7109.5);
+    EXPECT_EQ((*aPar)["sar_processing.ProcessedLines"].getInteger(), 40);
+    const std::string aTrace = aBox.trace();
+    EXPECT_NE(aTrace.find("\nStep (0) Processing parameters construction"), std::string::npos);
+    EXPECT_NE(aTrace.find("FOC TOTAL TIME (s): "), std::string::npos);
+    EXPECT_NE(aBox.log().find("\n\nSUCCESSFUL\n\n"), std::string::npos);
+}
+
+TEST(DriverProcess, PrfExtractionRecordsSegmentsAndKeepsTheOriginalHeaderOnce)
+{
+    DriverSandbox aBox;
+    qtest::SmallRawOptions aOptions;
+    aOptions.mChangeLine = 25;
+    const auto aRaw = makeRaw(aBox, "changing_raw", aOptions);
+    auto aArgs = DriverSandbox::defaultArguments(aRaw, aBox.data() / "x_slc");
+    aArgs[1] = "NotOK";
+    aArgs[14] = "OK";  // no step at all: the scan alone
+    ASSERT_EQ(aBox.run(aBox.writeArguments(aArgs)).mStatus, 0);
+    {
+        qtest::InProcessEnvironment aEnv;
+        auto aHeader = readHeader(aRaw.string() + "_hdr");
+        const CDescriptionField& aChanges = (*aHeader)["ChannelInfo.PRFChanges"];
+        ASSERT_EQ(aChanges.getNbrOfRows(), 2);
+        EXPECT_DOUBLE_EQ(aChanges.getDouble(0, 0), 0.0);
+        EXPECT_NEAR(aChanges.getDouble(0, 1), 1.0 / (2822 * 210.94e-9), 1e-6);
+        EXPECT_DOUBLE_EQ(aChanges.getDouble(1, 0), 25.0);
+        EXPECT_NEAR(aChanges.getDouble(1, 1), 1.0 / (2802 * 210.94e-9), 1e-6);
+        // "PRF" takes the extracted value; the original header is kept with that change only.
+        EXPECT_DOUBLE_EQ((*aHeader)["ChannelInfo.PRF"].getDouble(0), 1679.9);
+        auto aOld = readHeader(aRaw.string() + "_old_hdr");
+        EXPECT_TRUE((*aOld)["ChannelInfo.PRFChanges"].isEmpty());
+    }
+    EXPECT_NE(aBox.log().find("CHANGES IN PRF - *********************** 1 PRF CHANGES in " + aRaw.string()),
+              std::string::npos);
+    EXPECT_NE(aBox.trace().find("OLD PRIC[2820];  NEW PRIC [2800]"), std::string::npos);
+
+    // A second run keeps the first copy of the original header.
+    const auto aOldTime = std::filesystem::last_write_time(aRaw.string() + "_old.sml");
+    ASSERT_EQ(aBox.run(aBox.writeArguments(aArgs)).mStatus, 0);
+    EXPECT_EQ(std::filesystem::last_write_time(aRaw.string() + "_old.sml"), aOldTime);
+
+    // A constant code is one segment; an ENVISAT-1 product is left untouched.
+    const auto aSteady = makeRaw(aBox, "steady_raw");
+    aArgs[0] = aSteady.string();
+    ASSERT_EQ(aBox.run(aBox.writeArguments(aArgs)).mStatus, 0);
+    EXPECT_NE(aBox.log().find("\n\nNO PRF :  "), std::string::npos);
+    qtest::SmallRawOptions aEnvisat;
+    aEnvisat.mSensor = "ENVISAT-1";
+    aArgs[0] = makeRaw(aBox, "asar_raw", aEnvisat).string();
+    ASSERT_EQ(aBox.run(aBox.writeArguments(aArgs)).mStatus, 0);
+    EXPECT_FALSE(std::filesystem::exists(aArgs[0] + "_old.sml"));
 }
 
 }  // namespace
