@@ -42,4 +42,15 @@ TEST(Progress, ADeletedWorkingFileIsCreatedAnew)
     EXPECT_NE(aEnv.trace().find("] getAndSetPerc - Not found the file : " + gWorkingFile), std::string::npos);
 }
 
+TEST(Progress, AWorkingFileThatCannotBeOpenedIsGivenUpQuietly)
+{
+    qtest::InProcessEnvironment aEnv;
+    // A path that exists but cannot be opened for update, as a file held by the calling program.
+    std::filesystem::remove(gWorkingFile);
+    std::filesystem::create_directory(gWorkingFile);
+    EXPECT_TRUE(getAndSetPerc(5, 6, "title"));
+    EXPECT_NE(aEnv.trace().find("3 File " + gWorkingFile + " attempt open : "), std::string::npos);
+    std::filesystem::remove(gWorkingFile);
+}
+
 }  // namespace
