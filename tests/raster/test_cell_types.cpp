@@ -1,0 +1,51 @@
+// Cell type and data unit tables.
+#include <gtest/gtest.h>
+
+#include "qorv_cell_types.h"
+#include "qorvex_test_support.h"
+
+TEST(CellTypes, NamesCodesAndSizes)
+{
+    const int aBytes[CQORV_CELL_TYPE_NBR] = {1, 2, 1, 2, 2, 2, 4, 4, 8, 8, 16, 4, 4, 1, 4};
+    for (int i = 0; i < CQORV_CELL_TYPE_NBR; ++i) {
+        EXPECT_EQ(fqorvCellTypeFromName(fqorvCellTypeName(i)), i);
+        int b = 0, n = 0;
+        EXPECT_EQ(fqorvCellTypeSize(i, b, n), 0);
+        EXPECT_EQ(b, aBytes[i]) << fqorvCellTypeName(i);
+        EXPECT_EQ(n, fqorvCellTypeIsComplex(i) ? 2 : 1);
+    }
+    EXPECT_STREQ(fqorvCellTypeName(CQORV_CELL_UBYTE_COMPLEX), "UBYTE_COMPLEX");
+    EXPECT_STREQ(fqorvCellTypeName(CQORV_CELL_UNSIGNED_SHORT_COMPLEX), "UNSIGNED_SHORT_COMPLEX");
+    EXPECT_STREQ(fqorvCellTypeName(15), "WRONG CELL TYPE");
+    EXPECT_STREQ(fqorvCellTypeName(-1), "WRONG CELL TYPE");
+    EXPECT_EQ(fqorvCellTypeFromName("float_complex"), -1);  // exact text only
+    EXPECT_EQ(fqorvCellTypeFromName(nullptr), -1);
+    EXPECT_TRUE(fqorvCellTypeIsComplex(CQORV_CELL_UBYTE_COMPLEX));
+    EXPECT_FALSE(fqorvCellTypeIsComplex(CQORV_CELL_BIT));
+}
+
+TEST(CellTypes, UnknownCodeReportsOnTheTrace)
+{
+    qtest::InProcessEnvironment aEnv;
+    int b = 0, n = 0;
+    EXPECT_EQ(fqorvCellTypeSize(99, b, n), -1);
+    EXPECT_EQ(b, -1);
+    EXPECT_NE(aEnv.trace().find("Error: unsupported raster file type 99"), std::string::npos);
+}
+
+TEST(DataUnits, TextsAndTheMissingCode)
+{
+    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_POWER), "POWER");
+    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_SLC), "SLC");
+    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_JERS1_RAW), "JERS 1 RAW");
+    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_SIRC_RAW), "SIR-C RAW");
+    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_REFLECTANCE), "REFLECTANCE");
+    EXPECT_STREQ(fqorvDataUnitsName(21), "WRONG UNITS");
+    EXPECT_STREQ(fqorvDataUnitsName(39), "WRONG UNITS");
+    for (int i = 0; i <= CQORV_DATA_UNITS_MAX; ++i)
+        if (i != 21) {
+            EXPECT_EQ(fqorvDataUnitsFromName(fqorvDataUnitsName(i)), i);
+        }
+    EXPECT_EQ(fqorvDataUnitsFromName("WRONG UNITS"), -1);
+    EXPECT_EQ(fqorvDataUnitsFromName("LOGARITMIC"), CQORV_UNITS_LOGARITMIC);
+}

@@ -1,0 +1,640 @@
+// The flat raster file: layouts, byte orders, seeks beyond 2 GB, cache, completion and refusals.
+#include <cmath>
+#include <csignal>
+#include <cstring>
+#include <fcntl.h>
+#include <sys/resource.h>
+#include <sys/stat.h>
+#include <sys/types.h>
+#include <thread>
+#include <unistd.h>
+
+#include <gtest/gtest.h>
+#include <tiffio.h>
+
+#include "qorv_errors.h"
+#include "qorvex_test_support.h"
+#include "raster_test_util.h"
+#include "tools_raster_file_exp.h"
+
+using namespace rtest;
+
+namespace {
+
+class RasterFileTest : public ::testing::Test {
+protected:
+    std::string path(const std::string& theName) const { return mEnv.workPath(theName).string(); }
+    int countOf(const std::string& theText) const
+    {
+        const std::string aTrace = mEnv.trace();
+        int n = 0;
+        for (std::size_t p = aTrace.find(theText); p != std::string::npos; p = aTrace.find(theText, p + 1)) ++n;
+        return n;
+    }
+    qtest::InProcessEnvironment mEnv;
+};
+
+// A pattern of distinct bytes for theCount bytes.
+std::vector<uint8_t> pattern(std::size_t theCount, int theSeed = 3)
+{
+    std::vector<uint8_t> aBytes(theCount);
+    for (std::size_t i = 0; i < theCount; ++i) aBytes[i] = static_cast<uint8_t>((i * 7 + theSeed) & 0xff);
+    return aBytes;
+}
+
+}  // namespace
+
+TEST_F(RasterFileTest, GeometryBoundsAreInclusive)
+{
+    const std::string aName = path("bounds");
+    writeBytes(aName, {});
+    CRasterFile f;
+    f.openRead(param(aName, CQORV_RASTER_FILE_MAX_ROWS, CQORV_RASTER_FILE_MAX_ROWS, CQORV_CELL_UNSIGNED_BYTE));
+    EXPECT_EQ(f.getStatus(), CQORV_RF_OPEN_READ);
+    f.close();
+    EXPECT_EQ(f.getStatus(), CQORV_RF_CLOSE);
+
+    EXPECT_QORV_FAILURE(f.openRead(param(aName, CQORV_RASTER_FILE_MAX_ROWS + 1, 1, CQORV_CELL_UNSIGNED_BYTE)),
+                        CQORV_ERR_RASTER_ACCESS);
+    EXPECT_NE(mEnv.trace().find("mNrOfLinesPerImage = 900001"), std::string::npos);
+    mEnv.reinit();
+    EXPECT_QORV_FAILURE(f.openRead(param(aName, 1, CQORV_RASTER_FILE_MAX_ROWS + 1, CQORV_CELL_UNSIGNED_BYTE)),
+                        CQORV_ERR_RASTER_ACCESS);
+    EXPECT_NE(mEnv.trace().find("mNrOfPixelsPerLine = 900001"), std::string::npos);
+    EXPECT_NE(mEnv.trace().find("CQORV_RASTER_FILE_MAX_ROWS = 900000"), std::string::npos);
+    mEnv.reinit();
+    EXPECT_QORV_FAILURE(f.openRead(param(aName, 0, 1, CQORV_CELL_UNSIGNED_BYTE)), CQORV_ERR_RASTER_ACCESS);
+}
+
+// Every cell type in both byte orders: the file holds each component in the asked order, a read
+// gives the native values back, and one-byte components never swap.
+TEST_F(RasterFileTest, EveryCellTypeInBothByteOrders)
+{
+    for (int aType = 0; aType < CQORV_CELL_TYPE_NBR; ++aType) {
+        for (bool aMSBF : {false, true}) {
+            SCOPED_TRACE(std::string(fqorvCellTypeName(aType)) + (aMSBF ? " MSBF" : " LSBF"));
+            const int aLines = 3, aPixels = 13;
+            const std::string aName = path("cells_" + std::to_string(aType) + (aMSBF ? "_m" : "_l"));
+            CRasterFile w;
+            w.openWrite(CQORV_RF_OPEN_WRITE, param(aName, aLines, aPixels, aType, aMSBF));
+            const int aGroup = w.getBytesPerPixel() / w.getDataNbr();
+            EXPECT_EQ(w.isSwapped(), aGroup >= 2 && aMSBF != fqorvMachineIsMSBF());
+            const std::vector<uint8_t> aNative = pattern(static_cast<std::size_t>(w.getLineBytes()) * aLines, aType);
+            std::vector<uint8_t> aBuffer = aNative;
+            w.writeLines(0, aLines, aBuffer.data());
+            w.close();
+
+            const bool aOther = aMSBF != fqorvMachineIsMSBF();
+            EXPECT_EQ(fileBytes(aName), aOther ? swapped(aNative, aGroup) : aNative);
+
+            CRasterFile r;
+            r.openRead(param(aName, aLines, aPixels, aType, aMSBF));
+            std::vector<uint8_t> aBack(aNative.size());
+            r.readLines(0, aLines, 0, aPixels - 1, aBack.data());
+            EXPECT_EQ(aBack, aNative);
+            r.close();
+        }
+    }
+}
+
+TEST_F(RasterFileTest, ComplexCellsSwapComponentByComponent)
+{
+    const std::string aName = path("fc_msbf");
+    CRasterFile w;
+    const bool aOther = !fqorvMachineIsMSBF();
+    w.openWrite(CQORV_RF_OPEN_WRITE, param(aName, 1, 1, CQORV_CELL_FLOAT_COMPLEX, aOther));
+    fcomplex aCell(1.0f, -2.0f);
+    w.writeLines(0, 1, &aCell);
+    w.close();
+    const std::vector<uint8_t> aFile = fileBytes(aName);
+    ASSERT_EQ(aFile.size(), 8u);
+    float aRe = 1.0f, aIm = -2.0f;
+    std::vector<uint8_t> aExpected = swapped(asBytes(std::vector<float>{aRe, aIm}), 4);
+    EXPECT_EQ(aFile, aExpected);  // each 4-byte part reversed on its own, parts in place
+}
+
+TEST_F(RasterFileTest, ScaleFactorFlag)
+{
+    const std::string aName = path("scale");
+    writeBytes(aName, std::vector<uint8_t>(8, 0));
+    auto aFlag = [&](double theRe, double theIm) {
+        CRasterFileParam p = param(aName, 1, 1, CQORV_CELL_FLOAT_COMPLEX);
+        p.mRealScaleFactor = theRe;
+        p.mImaginaryScaleFactor = theIm;
+        CRasterFile f;
+        f.openRead(p);
+        const bool aSet = f.hasScaleFactor();
+        f.close();
+        return aSet;
+    };
+    EXPECT_FALSE(aFlag(1.0, 1.0));
+    EXPECT_TRUE(aFlag(2.0, 1.0));
+    EXPECT_TRUE(aFlag(1.0, NAN));
+    EXPECT_TRUE(aFlag(NAN, 1.0));
+    EXPECT_TRUE(aFlag(1.0, INFINITY));
+}
+
+// Reads clamp a start row outside the image to the nearest line; without prefix and suffix a read
+// from column 0 delivers whole records even for a short last column, with a prefix it packs.
+TEST_F(RasterFileTest, ClampingAndWholeRecordRoad)
+{
+    const int aLines = 4, aPixels = 6;
+    const std::string aName = path("clamp");
+    std::vector<float> aAll(aLines * aPixels);
+    for (int i = 0; i < aLines * aPixels; ++i) aAll[i] = static_cast<float>(i);
+    writeBytes(aName, asBytes(aAll));
+
+    CRasterFile f;
+    f.openRead(param(aName, aLines, aPixels, CQORV_CELL_FLOAT));
+    std::vector<float> aLine(aPixels);
+    f.readLines(10, 1, 0, aPixels - 1, aLine.data());
+    EXPECT_EQ(aLine[0], 18.0f);
+    EXPECT_NE(mEnv.trace().find("Requested line 10 is outside the image!\n"), std::string::npos);
+    f.readLines(-3, 1, 0, aPixels - 1, aLine.data());
+    EXPECT_EQ(aLine[0], 0.0f);
+
+    std::vector<float> aTwo(2 * aPixels, -1.0f);
+    f.readLines(0, 2, 0, 2, aTwo.data());
+    EXPECT_EQ(aTwo, std::vector<float>(aAll.begin(), aAll.begin() + 2 * aPixels));
+    f.close();
+
+    // The same lines behind a prefix: the columns come packed, three per line.
+    const std::string aPrefixed = path("clamp_prefix");
+    std::vector<uint8_t> aBytes;
+    for (int l = 0; l < aLines; ++l) {
+        aBytes.insert(aBytes.end(), {0xAA, 0xBB});
+        const std::vector<uint8_t> aRow = asBytes(std::vector<float>(aAll.begin() + l * aPixels, aAll.begin() + (l + 1) * aPixels));
+        aBytes.insert(aBytes.end(), aRow.begin(), aRow.end());
+    }
+    writeBytes(aPrefixed, aBytes);
+    CRasterFileParam p = param(aPrefixed, aLines, aPixels, CQORV_CELL_FLOAT);
+    p.mRowPrefix = 2;
+    f.openRead(p);
+    std::vector<float> aPacked(6, -1.0f);
+    f.readLines(1, 2, 1, 3, aPacked.data());
+    EXPECT_EQ(aPacked, (std::vector<float>{7, 8, 9, 13, 14, 15}));
+    uint8_t aPrefix[2] = {0, 0};
+    f.readRowPrefix(3, aPrefix);
+    EXPECT_EQ(aPrefix[0], 0xAA);
+    EXPECT_EQ(aPrefix[1], 0xBB);
+    f.close();
+}
+
+// Header gap, prefix and suffix in write and update status, in big-endian order.
+TEST_F(RasterFileTest, PrefixSuffixAndHeaderGap)
+{
+    const std::string aName = path("prefixed");
+    const int aLines = 3, aPixels = 4, aHeader = 7, aPrefixLen = 3, aSuffix = 2;
+    CRasterFileParam p = param(aName, aLines, aPixels, CQORV_CELL_SHORT, true);
+    p.mHeaderLen = aHeader;
+    p.mRowPrefix = aPrefixLen;
+    p.mRowSuffix = aSuffix;
+
+    CRasterFile w;
+    w.openWrite(CQORV_RF_OPEN_WRITE, p);
+    EXPECT_EQ(w.getRecordLen(), aPrefixLen + aPixels * 2 + aSuffix);
+    const uint8_t aTag[3] = {'A', 'B', 'C'};
+    w.setRowPrefix(aTag);
+    for (int l = 0; l < aLines; ++l) {
+        std::vector<int16_t> aRow = {int16_t(l * 100 + 1), int16_t(l * 100 + 2), int16_t(-l - 1), int16_t(0x1234)};
+        w.writeLines(l, 1, aRow.data());
+    }
+    w.close();
+
+    const std::vector<uint8_t> aFile = fileBytes(aName);
+    const int aRecord = aPrefixLen + aPixels * 2 + aSuffix;
+    ASSERT_EQ(aFile.size(), static_cast<std::size_t>(aHeader + aLines * aRecord));
+    for (int i = 0; i < aHeader; ++i) EXPECT_EQ(aFile[i], 0);
+    for (int l = 0; l < aLines; ++l) {
+        const uint8_t* r = aFile.data() + aHeader + l * aRecord;
+        EXPECT_EQ(std::string(reinterpret_cast<const char*>(r), 3), "ABC");
+        const int16_t aFirst = static_cast<int16_t>(l * 100 + 1);
+        EXPECT_EQ(r[3], static_cast<uint8_t>(aFirst >> 8));  // big-endian in the file
+        EXPECT_EQ(r[4], static_cast<uint8_t>(aFirst & 0xff));
+        EXPECT_EQ(r[9], 0x12);
+        EXPECT_EQ(r[10], 0x34);
+        EXPECT_EQ(r[aRecord - 1], 0);
+    }
+
+    // Update two columns of line 1 in place: prefix, other columns and suffix stay.
+    CRasterFile u;
+    u.openWrite(CQORV_RF_OPEN_READ_WRITE, p);
+    std::vector<int16_t> aTwo = {int16_t(-7), int16_t(77)};
+    u.writeLines(1, 1, aTwo.data(), 1, 2);
+    std::vector<int16_t> aBack(aPixels);
+    u.readLines(1, 1, 0, aPixels - 1, aBack.data());
+    EXPECT_EQ(aBack, (std::vector<int16_t>{101, -7, 77, 0x1234}));
+    u.readLines(2, 1, 0, aPixels - 1, aBack.data());  // reading on after the update
+    EXPECT_EQ(aBack, (std::vector<int16_t>{201, 202, -3, 0x1234}));
+    u.close();
+    const std::vector<uint8_t> aAfter = fileBytes(aName);
+    ASSERT_EQ(aAfter.size(), aFile.size());
+    for (std::size_t i = 0; i < aFile.size(); ++i) {
+        const std::size_t aLineStart = aHeader + aRecord;
+        const bool aChanged = i >= aLineStart + 5 && i < aLineStart + 9;
+        if (!aChanged) {
+            EXPECT_EQ(aAfter[i], aFile[i]) << "byte " << i;
+        }
+    }
+}
+
+TEST_F(RasterFileTest, NullLineCompletionAtClose)
+{
+    const std::string aName = path("nulls");
+    CRasterFileParam p = param(aName, 5, 3, CQORV_CELL_FLOAT);
+    p.mRowPrefix = 2;
+    CRasterFile w;
+    w.openWrite(CQORV_RF_OPEN_WRITE, p);
+    const uint8_t aTag[2] = {9, 9};
+    w.setRowPrefix(aTag);
+    std::vector<float> aRow = {1, 2, 3};
+    w.writeLines(0, 1, aRow.data());
+    w.close();
+
+    const std::vector<uint8_t> aFile = fileBytes(aName);
+    const int aRecord = 2 + 3 * 4;
+    ASSERT_EQ(aFile.size(), static_cast<std::size_t>(5 * aRecord));
+    EXPECT_EQ(aFile[0], 9);
+    for (std::size_t i = aRecord; i < aFile.size(); ++i) ASSERT_EQ(aFile[i], 0) << "byte " << i;  // prefix too
+    EXPECT_EQ(countOf("WARNING NULL line writed :1 in file :"), 1);
+
+    // Lines skipped in the middle are not filled; only the tail counts.
+    const std::string aHoles = path("holes");
+    w.openWrite(CQORV_RF_OPEN_WRITE, param(aHoles, 6, 3, CQORV_CELL_FLOAT));
+    w.writeLines(0, 1, aRow.data());
+    aRow = {4, 5, 6};
+    w.writeLines(3, 1, aRow.data());
+    EXPECT_EQ(w.getMaxLineWritten(), 4);
+    w.close();
+    EXPECT_EQ(fileSize(aHoles), 6 * 12);
+    EXPECT_EQ(countOf("WARNING NULL line writed :4 in file :"), 1);
+
+    // A file written to the end is not touched.
+    const std::string aFull = path("full");
+    w.openWrite(CQORV_RF_OPEN_WRITE, param(aFull, 2, 3, CQORV_CELL_FLOAT));
+    std::vector<float> aBoth(6, 1.0f);
+    w.writeLines(0, 2, aBoth.data());
+    w.close();
+    EXPECT_EQ(countOf("WARNING NULL line writed"), 2);
+}
+
+// The read window runs forward for lines "INCREASE" and backward for "DECREASE"; a line inside
+// the window costs no file access.
+TEST_F(RasterFileTest, ReadCacheInBothTimeDirections)
+{
+    const int aLines = 10, aPixels = 5;
+    const std::string aName = path("cache");
+    std::vector<fcomplex> aAll(aLines * aPixels);
+    for (int l = 0; l < aLines; ++l)
+        for (int c = 0; c < aPixels; ++c) aAll[l * aPixels + c] = fcomplex(float(l), float(c));
+    writeBytes(aName, asBytes(aAll));
+
+    auto aCellAt = [](const uint8_t* p) { fcomplex v; std::memcpy(&v, p, sizeof v); return v; };
+
+    CRasterFile f;
+    f.openRead(param(aName, aLines, aPixels, CQORV_CELL_FLOAT_COMPLEX));
+    f.setLineCache(4);
+    EXPECT_EQ(aCellAt(f.getLine(2)), fcomplex(2, 0));
+    EXPECT_EQ(f.getLinePosition(), 6);  // window 2..5 read in one go
+    EXPECT_EQ(aCellAt(f.getLine(5, 3)), fcomplex(5, 3));
+    EXPECT_EQ(f.getLinePosition(), 6);  // no access
+    EXPECT_EQ(aCellAt(f.getLine(8)), fcomplex(8, 0));
+    EXPECT_EQ(f.getLinePosition(), 10);  // window 8..9, cut at the last line
+    EXPECT_EQ(aCellAt(f.getLine(1, 4)), fcomplex(1, 4));
+    f.close();
+
+    CRasterFileParam p = param(aName, aLines, aPixels, CQORV_CELL_FLOAT_COMPLEX);
+    p.mLinesTimeDecrease = true;
+    f.openRead(p);
+    f.setLineCache(4);
+    EXPECT_EQ(aCellAt(f.getLine(7)), fcomplex(7, 0));
+    EXPECT_EQ(f.getLinePosition(), 8);  // window 4..7
+    EXPECT_EQ(aCellAt(f.getLine(4, 2)), fcomplex(4, 2));
+    EXPECT_EQ(f.getLinePosition(), 8);
+    EXPECT_EQ(aCellAt(f.getLine(2)), fcomplex(2, 0));
+    EXPECT_EQ(f.getLinePosition(), 3);  // window 0..2, cut at line 0
+
+    // Typed reads in this direction walk the file backward through the windows.
+    std::vector<fcomplex> aLine(aPixels);
+    for (int r = 0; r < aLines; ++r) {
+        fqorvReadLine(f, aLine.data(), r);
+        ASSERT_EQ(aLine[1], fcomplex(float(aLines - 1 - r), 1.0f)) << "row " << r;
+    }
+    f.close();
+}
+
+TEST_F(RasterFileTest, WriteQueueKeepsOrderAndFlushes)
+{
+    const int aLines = 7, aPixels = 3;
+    const std::string aName = path("queue");
+    CRasterFile w;
+    w.openWrite(CQORV_RF_OPEN_WRITE, param(aName, aLines, aPixels, CQORV_CELL_FLOAT));
+    w.setLineCache(3);
+    const int aOrder[aLines] = {5, 6, 0, 1, 2, 3, 4};
+    std::vector<float> aRow(aPixels);
+    for (int i = 0; i < aLines; ++i) {
+        for (int c = 0; c < aPixels; ++c) aRow[c] = float(aOrder[i] * 10 + c);
+        fqorvWriteLine(w, aRow.data(), aOrder[i]);
+        if (i == 2) {
+            EXPECT_EQ(w.getMaxLineWritten(), 0);  // all three held
+        }
+    }
+    EXPECT_GT(w.getMaxLineWritten(), 0);
+    w.close();
+    EXPECT_EQ(countOf("WARNING NULL line writed"), 0);
+
+    std::vector<float> aFile = fromBytes<float>(fileBytes(aName).data(), aLines * aPixels);
+    for (int l = 0; l < aLines; ++l)
+        for (int c = 0; c < aPixels; ++c) EXPECT_EQ(aFile[l * aPixels + c], float(l * 10 + c));
+}
+
+// A read past the end of a short file fails with 261125 instead of returning old bytes, on the
+// whole-record road, on the per-line road and through the cache.
+TEST_F(RasterFileTest, ShortFileReadFails)
+{
+    const int aPixels = 4, aRecord = aPixels * 4;
+    const std::string aName = path("short");
+    std::vector<uint8_t> aBytes = pattern(3 * aRecord + aRecord / 2);
+    writeBytes(aName, aBytes);
+    std::vector<float> aLine(aPixels * 2);
+
+    {
+        CRasterFile f;
+        f.openRead(param(aName, 5, aPixels, CQORV_CELL_FLOAT));
+        f.readLines(2, 1, 0, aPixels - 1, aLine.data());
+        EXPECT_QORV_FAILURE(f.readLines(3, 1, 0, aPixels - 1, aLine.data()), CQORV_ERR_RASTER_READ);
+        EXPECT_NE(mEnv.trace().find("Read file  ERROR : STATUS 1"), std::string::npos);
+    }
+    mEnv.reinit();
+    {
+        CRasterFile f;
+        f.openRead(param(aName, 5, aPixels, CQORV_CELL_FLOAT));
+        EXPECT_QORV_FAILURE(f.readLines(2, 2, 1, 2, aLine.data()), CQORV_ERR_RASTER_READ);  // per-line road
+    }
+    mEnv.reinit();
+    {
+        CRasterFile f;
+        f.openRead(param(aName, 5, aPixels, CQORV_CELL_FLOAT));
+        f.setLineCache(8);
+        EXPECT_QORV_FAILURE(f.getLine(0), CQORV_ERR_RASTER_READ);  // the window covers the missing lines
+    }
+    mEnv.reinit();
+    {
+        CRasterFile f;
+        f.openWrite(CQORV_RF_OPEN_READ_WRITE, param(aName, 5, aPixels, CQORV_CELL_FLOAT));
+        EXPECT_QORV_FAILURE(fqorvReadLine(f, aLine.data(), 4), CQORV_ERR_RASTER_READ);
+    }
+}
+
+// A sparse file above 2 GB (no disk cost): its last line is read and written through 64-bit
+// offsets on both seek roads.
+TEST_F(RasterFileTest, SparseFileBeyondTwoGigabytes)
+{
+    const int aPixels = 5616, aLines = 48000, aHeader = 100;
+    const int aRecord = aPixels * 8;
+    const int64_t aSize = int64_t(aHeader) + int64_t(aRecord) * aLines;
+    ASSERT_GT(aSize, int64_t(1) << 31);
+    const std::string aName = path("sparse");
+    {
+        const int fd = ::open(aName.c_str(), O_CREAT | O_RDWR | O_TRUNC, 0644);
+        ASSERT_GE(fd, 0);
+        ASSERT_EQ(::ftruncate(fd, static_cast<off_t>(aSize)), 0);
+        std::vector<fcomplex> aLast(aPixels);
+        for (int c = 0; c < aPixels; ++c) aLast[c] = fcomplex(float(c), -1.0f);
+        const off_t aOffset = static_cast<off_t>(aHeader + int64_t(aRecord) * (aLines - 1));
+        ASSERT_EQ(::pwrite(fd, aLast.data(), aRecord, aOffset), aRecord);
+        ::close(fd);
+    }
+    CRasterFileParam p = param(aName, aLines, aPixels, CQORV_CELL_FLOAT_COMPLEX);
+    p.mHeaderLen = aHeader;
+    std::vector<fcomplex> aLine(aPixels);
+
+    CRasterFile f;
+    f.openRead(p);
+    EXPECT_EQ(f.getMaxLineSeek(), 2000000000 / aRecord);
+    fqorvReadLine(f, aLine.data(), 1);  // the first seek after the open: the ordinary road
+    EXPECT_EQ(aLine[3], fcomplex(0.0f, 0.0f));
+    EXPECT_TRUE(f.isLongSeek());
+    fqorvReadLine(f, aLine.data(), aLines - 1);  // beyond the threshold: the descriptor road
+    EXPECT_EQ(aLine[5615], fcomplex(5615.0f, -1.0f));
+    fqorvReadLine(f, aLine.data(), 1);  // from beyond the threshold back under it
+    EXPECT_EQ(aLine[3], fcomplex(0.0f, 0.0f));
+    fqorvReadLine(f, aLine.data(), aLines - 1, 100, 101);
+    EXPECT_EQ(aLine[0], fcomplex(100.0f, -1.0f));
+    f.close();
+
+    // Update a line above 2 GB in place, and read it back on a fresh open.
+    f.openWrite(CQORV_RF_OPEN_READ_WRITE, p);
+    std::vector<fcomplex> aNew(aPixels, fcomplex(3.5f, 4.5f));
+    fqorvWriteLine(f, aNew.data(), aLines - 2);
+    f.close();
+    EXPECT_EQ(fileSize(aName), aSize);
+    f.openRead(p);
+    fqorvReadLine(f, aLine.data(), aLines - 2);
+    EXPECT_EQ(aLine[17], fcomplex(3.5f, 4.5f));
+    fqorvReadLine(f, aLine.data(), aLines - 1);
+    EXPECT_EQ(aLine[17], fcomplex(17.0f, -1.0f));
+    f.close();
+
+    // A new file written at its last line only: 64-bit seek on the write road, nothing completed.
+    const std::string aNewName = path("sparse_new");
+    p.mFileName = aNewName;
+    f.openWrite(CQORV_RF_OPEN_WRITE, p);
+    fqorvWriteLine(f, aNew.data(), aLines - 1);
+    f.close();
+    EXPECT_EQ(fileSize(aNewName), aSize);
+    struct stat s;
+    ASSERT_EQ(stat(aNewName.c_str(), &s), 0);
+    EXPECT_LT(static_cast<long long>(s.st_blocks) * 512, 64LL << 20);  // still sparse
+    EXPECT_EQ(countOf("WARNING NULL line writed"), 0);
+}
+
+TEST_F(RasterFileTest, RefusalsWithTheirIdsAndWords)
+{
+    const std::string aName = path("refuse");
+    writeBytes(aName, std::vector<uint8_t>(64, 1));
+    const CRasterFileParam p = param(aName, 4, 4, CQORV_CELL_FLOAT);
+    std::vector<float> aBuffer(16);
+    auto aTraceHas = [&](const char* theWords) { return mEnv.trace().find(theWords) != std::string::npos; };
+
+    CRasterFile f;
+    EXPECT_QORV_FAILURE(f.close(), CQORV_ERR_RASTER_ACCESS);
+    EXPECT_TRUE(aTraceHas("Error: attempting to close a raster file no file name while it was not open\n"));
+    mEnv.reinit();
+    EXPECT_QORV_FAILURE(f.readLines(0, 1, 0, 3, aBuffer.data()), CQORV_ERR_RASTER_READ);
+    EXPECT_TRUE(aTraceHas(" while it was not open\n"));
+    mEnv.reinit();
+    EXPECT_QORV_FAILURE(f.writeLines(0, 1, aBuffer.data()), CQORV_ERR_WRITE_FILE);
+    EXPECT_TRUE(aTraceHas("Error: attempting to write to the raster file "));
+    mEnv.reinit();
+
+    CRasterFileParam aNoName = p;
+    aNoName.mFileName.clear();
+    EXPECT_QORV_FAILURE(f.openRead(aNoName), CQORV_ERR_RASTER_ACCESS);
+    EXPECT_TRUE(aTraceHas("You have to set the file name in CRasterFileParam \n"));
+    mEnv.reinit();
+    EXPECT_QORV_FAILURE(f.openRead(param(path("missing"), 4, 4, CQORV_CELL_FLOAT)), CQORV_ERR_MISSING_FILE);
+    EXPECT_TRUE(aTraceHas("Error: cannot open the file: "));
+    EXPECT_TRUE(aTraceHas("  errno = 2"));
+    mEnv.reinit();
+    EXPECT_QORV_FAILURE(f.openWrite(CQORV_RF_OPEN_WRITE, param(path("no/such/dir/x"), 4, 4, CQORV_CELL_FLOAT)),
+                        CQORV_ERR_RASTER_ACCESS);
+    mEnv.reinit();
+    EXPECT_QORV_FAILURE(f.openRead(param(aName, 4, 4, 15)), CQORV_ERR_RASTER_READ);
+    EXPECT_TRUE(aTraceHas("Error: unsupported raster file type 15"));
+    EXPECT_TRUE(aTraceHas("theCellType = 15"));
+    mEnv.reinit();
+
+    f.openRead(p);
+    EXPECT_QORV_FAILURE(f.openRead(p), CQORV_ERR_RASTER_ACCESS);
+    EXPECT_TRUE(aTraceHas(" in input mode while it was not closed\n"));
+    mEnv.reinit();
+    EXPECT_QORV_FAILURE(f.writeLines(0, 1, aBuffer.data()), CQORV_ERR_WRITE_FILE);
+    EXPECT_TRUE(aTraceHas(" while it was open in read mode\n"));
+    mEnv.reinit();
+    EXPECT_QORV_FAILURE(f.readLines(0, 0, 0, 3, aBuffer.data()), CQORV_ERR_RASTER_READ);
+    EXPECT_TRUE(aTraceHas(" a negative or null number of lines\n"));
+    mEnv.reinit();
+    EXPECT_QORV_FAILURE(fqorvReadLine(f, aBuffer.data(), 0, 2, 1), CQORV_ERR_RASTER_ACCESS);
+    EXPECT_TRUE(aTraceHas("theColStart 2"));
+    mEnv.reinit();
+    EXPECT_QORV_FAILURE(fqorvReadLine(f, aBuffer.data(), 4), CQORV_ERR_RASTER_ACCESS);
+    mEnv.reinit();
+    f.close();
+
+    const std::string aOut = path("refuse_out");
+    f.openWrite(CQORV_RF_OPEN_WRITE, param(aOut, 4, 4, CQORV_CELL_FLOAT));
+    EXPECT_QORV_FAILURE(f.readLines(0, 1, 0, 3, aBuffer.data()), CQORV_ERR_RASTER_READ);
+    EXPECT_TRUE(aTraceHas(" while it was open in write mode\n"));
+    mEnv.reinit();
+    EXPECT_QORV_FAILURE(f.writeLines(0, -1, aBuffer.data()), CQORV_ERR_WRITE_FILE);
+    EXPECT_TRUE(aTraceHas("Error: attempting to write to the raster file "));
+    EXPECT_TRUE(aTraceHas(" a negative or null number of lines\n"));
+    mEnv.reinit();
+    f.close();
+}
+
+// A seek that the stream can't do (a pipe) fails the read with 261125 and the seek words.
+TEST_F(RasterFileTest, FailedSeekOnAPipe)
+{
+    const std::string aName = path("pipe");
+    ASSERT_EQ(::mkfifo(aName.c_str(), 0600), 0);
+    std::thread aWriter([&] {
+        const int fd = ::open(aName.c_str(), O_WRONLY);
+        std::vector<char> aData(400, 0);
+        if (fd >= 0) {
+            ssize_t n = ::write(fd, aData.data(), aData.size());
+            (void)n;
+            ::close(fd);
+        }
+    });
+    std::vector<float> aLine(4);
+    {
+        CRasterFile f;
+        f.openRead(param(aName, 10, 4, CQORV_CELL_FLOAT));
+        f.readLines(0, 1, 0, 3, aLine.data());  // sequential: no seek
+        EXPECT_QORV_FAILURE(f.readLines(5, 1, 0, 3, aLine.data()), CQORV_ERR_RASTER_READ);
+        const std::string aTrace = mEnv.trace();
+        EXPECT_NE(aTrace.find("FAIL seek AP : "), std::string::npos);
+        EXPECT_NE(aTrace.find("ERROR LOOP BEFORE seekLinePosition  :"), std::string::npos);
+        EXPECT_NE(aTrace.find("theRowStart = 5"), std::string::npos);
+    }
+    aWriter.join();
+}
+
+// A raster that meets a failure while it is written is closed without the null-line completion:
+// it keeps its whole written records only, and the ENVI header beside it goes.
+TEST_F(RasterFileTest, FailureLeavesNoClaimedLines)
+{
+    const std::string aName = path("failed");
+    qtest::writeFile(aName + ".hdr", "ENVI\nlines = 10\n");
+    auto aWriteThenFail = [&] {
+        CRasterFile w;
+        w.openWrite(CQORV_RF_OPEN_WRITE, param(aName, 10, 4, CQORV_CELL_FLOAT));
+        std::vector<float> aRow(4, 2.0f);
+        for (int l = 0; l < 3; ++l) fqorvWriteLine(w, aRow.data(), l);
+        fqorvWriteLine(w, aRow.data(), 42);  // a step's fault: the row is outside the image
+    };
+    EXPECT_QORV_FAILURE(aWriteThenFail(), CQORV_ERR_RASTER_ACCESS);
+    EXPECT_EQ(fileSize(aName), 3 * 16);
+    EXPECT_FALSE(qtest::fs::exists(aName + ".hdr"));
+    EXPECT_EQ(countOf("WARNING NULL line writed"), 0);
+    mEnv.reinit();
+
+    // Reading it back as the 10-line raster its header claims fails at the first missing line.
+    CRasterFile r;
+    r.openRead(param(aName, 10, 4, CQORV_CELL_FLOAT));
+    std::vector<float> aRow(4);
+    fqorvReadLine(r, aRow.data(), 2);
+    EXPECT_QORV_FAILURE(fqorvReadLine(r, aRow.data(), 3), CQORV_ERR_RASTER_READ);
+}
+
+// A real write failure (file size limit): 261124, and the file is cut to whole records.
+TEST_F(RasterFileTest, WriteFailureCutsToWholeRecords)
+{
+    const std::string aName = path("limited");
+    const int aPixels = 16384, aRecord = aPixels * 4;  // 64 KiB records
+    struct rlimit aOld;
+    ASSERT_EQ(getrlimit(RLIMIT_FSIZE, &aOld), 0);
+    auto aOldHandler = std::signal(SIGXFSZ, SIG_IGN);
+    struct rlimit aLimit = aOld;
+    aLimit.rlim_cur = 4u << 20;  // 4 MiB: 64 records
+    ASSERT_EQ(setrlimit(RLIMIT_FSIZE, &aLimit), 0);
+
+    CRasterFile w;
+    w.openWrite(CQORV_RF_OPEN_WRITE, param(aName, 200, aPixels, CQORV_CELL_FLOAT));
+    std::vector<float> aRow(aPixels, 1.0f);
+    int aFailedAt = -1;
+    for (int l = 0; l < 200 && aFailedAt < 0; ++l) {
+        try {
+            fqorvWriteLine(w, aRow.data(), l);
+        } catch (const qtest::QorvexExit& e) {
+            EXPECT_EQ(e.mId, CQORV_ERR_WRITE_FILE);
+            aFailedAt = l;
+        }
+    }
+    setrlimit(RLIMIT_FSIZE, &aOld);
+    std::signal(SIGXFSZ, aOldHandler);
+    ASSERT_GT(aFailedAt, 0);
+    EXPECT_TRUE(w.hasFailed());
+    EXPECT_NE(mEnv.trace().find("Error: impossible to write record "), std::string::npos);
+    mEnv.reinit();
+    w.close();
+    const long long aSize = fileSize(aName);
+    EXPECT_EQ(aSize % aRecord, 0);
+    EXPECT_LE(aSize, 64LL * aRecord);
+    EXPECT_EQ(w.getStatus(), CQORV_RF_CLOSE);
+}
+
+TEST_F(RasterFileTest, TiffStatesOpenAndClose)
+{
+    static int sHeaderWrites = 0;
+    QorvTiffHeaderWriter aOld = fqorvSetTiffHeaderWriter([](CRasterFile&) { ++sHeaderWrites; });
+    const std::string aName = path("picture.tif");
+    CRasterFile t;
+    t.openTiff(CQORV_RF_OPEN_TIFF_WRITE, param(aName, 2, 3, CQORV_CELL_UNSIGNED_BYTE));
+    EXPECT_EQ(t.getStatus(), CQORV_RF_OPEN_TIFF_WRITE);
+    TIFF* aTiff = static_cast<TIFF*>(t.tiffHandle());
+    ASSERT_NE(aTiff, nullptr);
+    TIFFSetField(aTiff, TIFFTAG_IMAGEWIDTH, 3);
+    TIFFSetField(aTiff, TIFFTAG_IMAGELENGTH, 2);
+    TIFFSetField(aTiff, TIFFTAG_BITSPERSAMPLE, 8);
+    TIFFSetField(aTiff, TIFFTAG_SAMPLESPERPIXEL, 1);
+    TIFFSetField(aTiff, TIFFTAG_PHOTOMETRIC, PHOTOMETRIC_MINISBLACK);
+    uint8_t aRow[3] = {1, 2, 3};
+    for (int r = 0; r < 2; ++r) ASSERT_EQ(TIFFWriteScanline(aTiff, aRow, r, 0), 1);
+    std::vector<float> aLine(3);
+    EXPECT_QORV_FAILURE(t.readLines(0, 1, 0, 2, aLine.data()), CQORV_ERR_RASTER_READ);
+    mEnv.reinit();
+    t.close(true);
+    EXPECT_EQ(sHeaderWrites, 1);
+    EXPECT_EQ(t.getStatus(), CQORV_RF_CLOSE);
+
+    t.openTiff(CQORV_RF_OPEN_TIFF_READ, param(aName, 2, 3, CQORV_CELL_UNSIGNED_BYTE));
+    EXPECT_EQ(t.getStatus(), CQORV_RF_OPEN_TIFF_READ);
+    uint32_t aWidth = 0;
+    TIFFGetField(static_cast<TIFF*>(t.tiffHandle()), TIFFTAG_IMAGEWIDTH, &aWidth);
+    EXPECT_EQ(aWidth, 3u);
+    t.close();
+    fqorvSetTiffHeaderWriter(aOld);
+}
