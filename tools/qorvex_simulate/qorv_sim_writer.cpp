@@ -1,0 +1,218 @@
+#include "qorv_sim_writer.h"
+
+#include <algorithm>
+#include <chrono>
+#include <cmath>
+#include <cstdio>
+#include <stdexcept>
+#include <thread>
+#include <vector>
+
+#include "qorv_cell_types.h"
+#include "qorv_description_section.h"
+#include "qorv_raster_file.h"
+#include "qorv_sim_echo.h"
+#include "qorv_sim_format.h"
+#include "qorv_sim_header.h"
+#include "qorv_sim_timeline.h"
+#include "qorv_sim_truth.h"
+
+namespace {
+
+constexpr double CQORV_SIM_LIGHT = 299792458.0;
+/// Pulses generated together, spread over the threads; bounds the memory of a run.
+constexpr long CQORV_SIM_BLOCK = 128;
+
+double secondsSince(std::chrono::steady_clock::time_point theStart)
+{
+    return std::chrono::duration<double>(std::chrono::steady_clock::now() - theStart).count();
+}
+
+int threadCount(const CSimScene& s)
+{
+    const int aHardware = static_cast<int>(std::max(1u, std::thread::hardware_concurrency()));
+    return std::clamp(s.mThreads > 0 ? s.mThreads : aHardware, 1, 64);
+}
+
+/// One block of pulses: encoded samples and clip counts, per pulse.
+struct CBlock {
+    long mFirst = 0;
+    long mCount = 0;
+    int mBytesPerLine = 0;
+    std::vector<uint8_t> mBytes;
+    std::vector<long> mClipped;
+};
+
+/// Generates and encodes pulses [first, first + count) of a block; pulses are dealt to the threads
+/// in turn, each with its own line buffer.
+void generateBlock(const CSimScene& s, const CSimEchoGenerator& theGenerator, double theGain, int theThreads, CBlock& b)
+{
+    auto work = [&](int theThread) {
+        std::vector<CSimSample> aLine(static_cast<std::size_t>(s.mSamples));
+        for (long i = theThread; i < b.mCount; i += theThreads) {
+            const long k = b.mFirst + i;
+            theGenerator.echo(k, aLine.data());
+            theGenerator.addNoise(k, aLine.data());
+            uint8_t* out = b.mBytes.data() + static_cast<std::size_t>(i) * b.mBytesPerLine;
+            if (s.mFormat == CSimSampleFormat::Ubyte5Bit)
+                b.mClipped[i] = fqorvSimQuantise5Bit(aLine.data(), s.mSamples, theGain, out);
+            else
+                b.mClipped[i] = fqorvSimQuantiseBaq4Bit(aLine.data(), s.mSamples, reinterpret_cast<float*>(out));
+        }
+    };
+    if (theThreads == 1) {
+        work(0);
+        return;
+    }
+    std::vector<std::thread> aPool;
+    for (int t = 0; t < theThreads; ++t) aPool.emplace_back(work, t);
+    for (std::thread& t : aPool) t.join();
+}
+
+CRasterFileParam rasterParam(const CSimScene& s, const CSimTimeline& tl, const std::string& thePath)
+{
+    CRasterFileParam p;
+    p.mFileName = thePath;
+    p.mNrOfLinesPerImage = static_cast<int32_t>(tl.records().size());
+    p.mNrOfPixelsPerLine = s.mSamples;
+    p.mCellType = s.mFormat == CSimSampleFormat::Ubyte5Bit ? CQORV_CELL_UBYTE_COMPLEX : CQORV_CELL_FLOAT_COMPLEX;
+    p.mDataUnits = s.mDataUnits == "ERS RAW" ? CQORV_UNITS_ERS_RAW : -1;
+    p.mHeaderLen = s.mHeaderOffset;
+    p.mRowPrefix = s.mPrefix.mSize;
+    p.mRowSuffix = 0;
+    p.mFooterLen = 0;
+    p.mDummyVal = -9999.0;
+    p.mByteOrderMSBF = true;
+    return p;
+}
+
+/// Streams all records of the scene into an open raster.
+void streamRecords(const CSimScene& s, const CSimTimeline& tl, const CSimEchoGenerator& theGenerator, double theGain,
+                   CRasterFile& theRaster, CSimRunReport& theReport, const CSimProgress& theProgress)
+{
+    const int aThreads = threadCount(s);
+    theReport.mThreads = aThreads;
+    CBlock b;
+    b.mBytesPerLine = s.mSamples * (s.mFormat == CSimSampleFormat::Ubyte5Bit ? 2 : 8);
+    b.mBytes.resize(static_cast<std::size_t>(CQORV_SIM_BLOCK) * b.mBytesPerLine);
+    b.mClipped.resize(CQORV_SIM_BLOCK);
+    std::vector<uint8_t> aPixels(static_cast<std::size_t>(b.mBytesPerLine));
+    std::vector<uint8_t> aPrefix(static_cast<std::size_t>(s.mPrefix.mSize));
+    const std::vector<CSimRecord>& aRecords = tl.records();
+    std::size_t aRecord = 0;
+    long aClipped = 0;
+    int aPercent = -1;
+    for (long aFirst = 0; aFirst < s.mPulses; aFirst += CQORV_SIM_BLOCK) {
+        b.mFirst = aFirst;
+        b.mCount = std::min(CQORV_SIM_BLOCK, s.mPulses - aFirst);
+        generateBlock(s, theGenerator, theGain, aThreads, b);
+        for (long i = 0; i < b.mCount; ++i) aClipped += b.mClipped[i];
+        // The records of the block's pulses, in file order (dropped pulses have none).
+        for (; aRecord < aRecords.size() && aRecords[aRecord].mPulse < aFirst + b.mCount; ++aRecord) {
+            const CSimRecord& r = aRecords[aRecord];
+            CSimPrefixValues v;
+            v.mCounter = r.mCounter;
+            v.mSwstCode = tl.swstCode(r.mPulse);
+            v.mPriCode = tl.priCode(r.mPulse);
+            v.mSlantRange = static_cast<int32_t>(std::lround(0.5 * CQORV_SIM_LIGHT * tl.windowDelay(r.mPulse)));
+            // Seeded by the pulse: a repeated record is a byte-for-byte copy, as in the archives.
+            fqorvSimEncodePrefix(s.mPrefix, v, s.mSeed, static_cast<uint64_t>(r.mPulse), aPrefix.data());
+            theRaster.setRowPrefix(aPrefix.data());
+            // The write swaps the buffer it is given: hand it a copy.
+            const uint8_t* src = b.mBytes.data() + static_cast<std::size_t>(r.mPulse - aFirst) * b.mBytesPerLine;
+            std::copy(src, src + b.mBytesPerLine, aPixels.begin());
+            theRaster.writeLines(static_cast<int>(aRecord), 1, aPixels.data());
+        }
+        const int aNow = static_cast<int>(100 * (aFirst + b.mCount) / s.mPulses);
+        if (theProgress && aNow != aPercent) theProgress(aNow);
+        aPercent = aNow;
+    }
+    theReport.mRecords = static_cast<long>(aRecords.size());
+    theReport.mClippedFraction = static_cast<double>(aClipped) / (2.0 * s.mPulses * s.mSamples);
+}
+
+/// The 5-bit gain: codes per unit amplitude so that each component's rms is mRmsDn, the signal
+/// power estimated from noise-free echoes of 64 pulses spread over the scene.
+double quantiserGain(const CSimScene& s, const CSimEchoGenerator& g, double& theSignalPower)
+{
+    theSignalPower = g.meanSignalPower(static_cast<int>(std::min<long>(64, s.mPulses)));
+    if (s.mGain > 0.0) return s.mGain;
+    const double aComponentPower = 0.5 * (theSignalPower + g.noiseVariance());
+    return aComponentPower > 0.0 ? s.mRmsDn / std::sqrt(aComponentPower) : 1.0;
+}
+
+void writeRasterWith(const CSimScene& s, const CSimTimeline& tl, const CSimEchoGenerator& g, const std::string& thePath,
+                     CSimRunReport& theReport, CSimRunFigures& theFigures, const CSimProgress& theProgress)
+{
+    const auto aStart = std::chrono::steady_clock::now();
+    theFigures.mGain = quantiserGain(s, g, theFigures.mSignalPower);
+    theFigures.mNoiseVariance = g.noiseVariance();
+    theFigures.mAzimuthGain = g.azimuthGain();
+    theFigures.mRangeGain = g.rangeGain();
+    CRasterFile aRaster;
+    aRaster.openWrite(CQORV_RF_OPEN_WRITE, rasterParam(s, tl, thePath));
+    streamRecords(s, tl, g, theFigures.mGain, aRaster, theReport, theProgress);
+    aRaster.close();
+    theReport.mGain = theFigures.mGain;
+    theFigures.mClippedFraction = theReport.mClippedFraction;
+    theReport.mPulses = s.mPulses;
+    theReport.mEchoSeconds = secondsSince(aStart);
+}
+
+void countTargets(const CSimScene& s, CSimRunReport& r)
+{
+    for (const CSimTarget& t : s.mTargets) (t.mListed ? r.mTargets : r.mScatterers) += 1;
+}
+
+std::string baseName(const std::string& thePath)
+{
+    const std::size_t aSlash = thePath.find_last_of('/');
+    return aSlash == std::string::npos ? thePath : thePath.substr(aSlash + 1);
+}
+
+}  // namespace
+
+void fqorvSimWriteRaster(const CSimScene& theScene, const std::string& thePath, CSimRunReport& theReport,
+                         const CSimProgress& theProgress)
+{
+    const std::unique_ptr<CSimOrbit> aOrbit = fqorvSimMakeOrbit(theScene);
+    const CSimTimeline aTimeline(theScene);
+    const CSimEchoGenerator aGenerator(theScene, *aOrbit, aTimeline);
+    CSimRunFigures aFigures;
+    countTargets(theScene, theReport);
+    writeRasterWith(theScene, aTimeline, aGenerator, thePath, theReport, aFigures, theProgress);
+}
+
+CSimRunReport fqorvSimRun(const CSimScene& theScene, const std::string& theRoot, const CSimProgress& theProgress)
+{
+    const auto aStart = std::chrono::steady_clock::now();
+    CSimRunReport aReport;
+    aReport.mRaster = theRoot;
+    aReport.mHeader = theRoot + ".sml";
+    aReport.mTruth = theRoot + "_truth.json";
+    countTargets(theScene, aReport);
+    // A product is complete when its header exists: take away what an earlier run left.
+    std::remove(aReport.mHeader.c_str());
+    std::remove(aReport.mTruth.c_str());
+
+    const std::unique_ptr<CSimOrbit> aOrbit = fqorvSimMakeOrbit(theScene);
+    const CSimTimeline aTimeline(theScene);
+    const CSimEchoGenerator aGenerator(theScene, *aOrbit, aTimeline);
+    const CSimSceneTruth aTruth = fqorvSimComputeTruth(theScene, *aOrbit, aTimeline);
+
+    CSimRunFigures aFigures;
+    aFigures.mRasterName = baseName(theRoot);
+    aFigures.mHeaderName = baseName(aReport.mHeader);
+    const std::string aPart = theRoot + ".part";
+    writeRasterWith(theScene, aTimeline, aGenerator, aPart, aReport, aFigures, theProgress);
+    if (std::rename(aPart.c_str(), theRoot.c_str()) != 0)
+        throw std::runtime_error("cannot rename " + aPart + " to " + theRoot);
+
+    fqorvSimTruthJson(theScene, aTruth, aTimeline, *aOrbit, aFigures).dumpFile(aReport.mTruth);
+
+    std::unique_ptr<CDescriptionHeader> aHeader = CDescriptionHeader::makeFull();
+    fqorvSimFillHeader(*aHeader, theScene, aTimeline, *aOrbit, aTruth);
+    if (!aHeader->write(theRoot.c_str(), true, false)) throw std::runtime_error("cannot write " + aReport.mHeader);
+    aReport.mSeconds = secondsSince(aStart);
+    return aReport;
+}
