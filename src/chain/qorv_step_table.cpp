@@ -14,7 +14,7 @@ namespace {
 int stepNotBuilt(int theArgc, char** theArgv)
 {
     const std::string aTitle = theArgc > 0 && theArgv[0] ? theArgv[0] : "";
-    const std::string aText = "step not available in this build:" + aTitle;
+    const std::string aText = "step not built:" + aTitle;  // fits one line of the result files
     fdfTrace("\nError: %s\n", aText.c_str());
     QORV_FATAL(CQORV_ERR_WRONG_REQUEST, aText.c_str());
 }

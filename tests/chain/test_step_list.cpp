@@ -56,9 +56,9 @@ TEST(StepArguments, SingleProductNamesEveryFileFromTheOutputRoot)
     EXPECT_EQ(aRun.stepArguments(4), (V{"/d/x_rc", "/d/x_par"}));
     EXPECT_EQ(aRun.stepArguments(3), (V{"/d/x_rc", "/d/x_par"}));
     EXPECT_EQ(aRun.stepArguments(5), (V{"/d/x_rc", "/d/x_slc", "/d/x_par", "1", "1", "8192", "0", "0", "-1", "-1"}));
-    EXPECT_EQ(aRun.stepArguments(6), (V{"/d/x_slc", "/d/x_pwr", "/d/x_par", "1", "5", "0", "OK", "0", "0"}));
-    EXPECT_EQ(aRun.stepArguments(7), (V{"/d/x_pwr", "/d/x_pwr.tif", "0"}));
-    EXPECT_EQ(aRun.stepArguments(8), (V{"/d/x_slc", "/d/x_slc.tif", "0", "1", "1"}));
+    EXPECT_EQ(aRun.stepArguments(6), (V{"/d/x_slc", "/d/x_pwr", "/d/x_par", "1", "5", "0", "OK", "NotOK", "NotOK"}));
+    EXPECT_EQ(aRun.stepArguments(7), (V{"/d/x_pwr", "/d/x_pwr.tif", "0.333"}));
+    EXPECT_EQ(aRun.stepArguments(8), (V{"/d/x_slc", "/d/x_slc.tif", "0.333", "1", "1"}));
     EXPECT_EQ(aRun.keepRoot(), "/d/x");
 }
 

@@ -223,8 +223,8 @@ std::vector<std::string> DriverSandbox::defaultArguments(const fs::path& theInpu
     // 0 input, 1 focus, 2 output root, 3/4 looks, 5 multi-look, 6 tiff, 7 delete, 8 tiff arg,
     // 9 look arg, 10 ambiguity, 11 end if missing, 12 step 5 last, 13 look arg, 14-17 skip steps
     // 0-3 ("OK" skips), 18 look arg.
-    return {theInput.string(), "OK", theOutputRoot.string(), "1", "5", "NotOK", "NotOK", "NotOK", "0",
-            "0", "NotOK", "NotOK", "NotOK", "0", "NotOK", "NotOK", "NotOK", "NotOK", "0"};
+    return {theInput.string(), "OK", theOutputRoot.string(), "1", "5", "NotOK", "NotOK", "NotOK", "0.333",
+            "0", "NotOK", "NotOK", "NotOK", "NotOK", "NotOK", "NotOK", "NotOK", "NotOK", "NotOK"};
 }
 
 fs::path DriverSandbox::writeArguments(const std::vector<std::string>& theArgs, const std::string& theName)
