@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "qorv_envi_util.h"
 #include "qorv_enviroment.h"
 #include "qorv_sim_options.h"
 #include "qorv_sim_scene.h"
@@ -60,6 +61,7 @@ int main(int argc, char** argv)
         return CQORV_SIM_EXIT_USAGE;
     }
     if (!initRuntime(aCommand.mConfigDir)) return CQORV_SIM_EXIT_USAGE;
+    fqorvRegisterEnviHeaderWriter();  // the raw raster gets its ENVI header beside the .sml
 
     try {
         CSimProgress aProgress;
