@@ -6,6 +6,8 @@
 #include <cmath>
 #include <cstdlib>
 
+#include <unistd.h>
+
 #include "qorv_enviroment.h"
 #include "qorv_errors.h"
 #include "qorvex_test_support.h"
@@ -137,6 +139,17 @@ TEST(DeferredDeletion, DeletesFlaggedEntriesOnly)
     EXPECT_TRUE(std::filesystem::exists(b));
     EXPECT_NE(aEnv.trace().find("NUMBER of file to delete : 2"), std::string::npos);
     EXPECT_NE(aEnv.trace().find("[1] NO deleteFile(" + b.string() + " , false)"), std::string::npos);
+}
+
+TEST(DeferredDeletion, AFailingRunLeavesTheHelperProgramToRemoveItsTemporaryFiles)
+{
+    InProcessEnvironment aEnv;
+    const auto aTemporary = aEnv.workPath("block.tmp");
+    qtest::writeFile(aTemporary, "temporary");
+    fdfAddDeleteFile(aTemporary.c_str(), true);
+    EXPECT_QORV_FAILURE(QORV_FATAL(CQORV_ERR_MEMORY, "block"), 522240);
+    for (int i = 0; i < 50 && std::filesystem::exists(aTemporary); ++i) usleep(100000);
+    EXPECT_FALSE(std::filesystem::exists(aTemporary));
 }
 
 }  // namespace
