@@ -517,20 +517,32 @@ void CRasterFile::swapPixels(uint8_t* theData, std::size_t theBytes) const
     }
 }
 
+/// Refuses a read (261125) or a write (261124) of a file that is closed, open in the other
+/// direction, or asked for no lines.
+void CRasterFile::refuseTransfer(bool theWrite, int theRowNbr)
+{
+    const int aId = theWrite ? CQORV_ERR_WRITE_FILE : CQORV_ERR_RASTER_READ;
+    const char* aVerb = theWrite ? "write to" : "read from";
+    const bool aClosed = mRasterStatus == CQORV_RF_CLOSE ||
+                         mRasterStatus == (theWrite ? CQORV_RF_OPEN_TIFF_WRITE : CQORV_RF_OPEN_TIFF_READ);
+    const bool aOtherDirection = theWrite
+                                     ? (mRasterStatus == CQORV_RF_OPEN_READ || mRasterStatus == CQORV_RF_OPEN_TIFF_READ)
+                                     : (mRasterStatus == CQORV_RF_OPEN_WRITE || mRasterStatus == CQORV_RF_OPEN_TIFF_WRITE);
+    if (aClosed)
+        failWith(aId, fqorvStringFormat("Error: attempting to %s the raster file %s while it was not open\n", aVerb,
+                                        mFileName.c_str()));
+    if (aOtherDirection)
+        failWith(aId, fqorvStringFormat("Error: attempting to %s the raster file %s while it was open in %s mode\n", aVerb,
+                                        mFileName.c_str(), theWrite ? "read" : "write"));
+    if (theRowNbr < 1)
+        failWith(aId, fqorvStringFormat("Error: attempting to %s the raster file %s a negative or null number of lines\n",
+                                        aVerb, mFileName.c_str()));
+}
+
 void CRasterFile::readLines(int theRowStart, int theRowNbr, int theColStart, int theColEnd, void* theBuffer,
                             bool theVerbose)
 {
-    if (mRasterStatus == CQORV_RF_CLOSE || mRasterStatus == CQORV_RF_OPEN_TIFF_READ)
-        failWith(CQORV_ERR_RASTER_READ, fqorvStringFormat("Error: attempting to read from the raster file %s while it was not open\n",
-                                                          mFileName.c_str()));
-    if (mRasterStatus == CQORV_RF_OPEN_WRITE || mRasterStatus == CQORV_RF_OPEN_TIFF_WRITE)
-        failWith(CQORV_ERR_RASTER_READ,
-                 fqorvStringFormat("Error: attempting to read from the raster file %s while it was open in write mode\n",
-                                   mFileName.c_str()));
-    if (theRowNbr < 1)
-        failWith(CQORV_ERR_RASTER_READ,
-                 fqorvStringFormat("Error: attempting to read from the raster file %s a negative or null number of lines\n",
-                                   mFileName.c_str()));
+    refuseTransfer(false, theRowNbr);
     if (mCellType == CQORV_CELL_BIT) {
         theColStart = 0;
         theColEnd = NrOfPixelsPerLine - 1;
@@ -577,17 +589,7 @@ void CRasterFile::readLines(int theRowStart, int theRowNbr, int theColStart, int
 void CRasterFile::writeLines(int theRowStart, int theRowNbr, void* theBuffer, int theColStart, int theColEnd,
                              bool theVerbose)
 {
-    if (mRasterStatus == CQORV_RF_CLOSE || mRasterStatus == CQORV_RF_OPEN_TIFF_WRITE)
-        failWith(CQORV_ERR_WRITE_FILE, fqorvStringFormat("Error: attempting to write to the raster file %s while it was not open\n",
-                                                         mFileName.c_str()));
-    if (mRasterStatus == CQORV_RF_OPEN_READ || mRasterStatus == CQORV_RF_OPEN_TIFF_READ)
-        failWith(CQORV_ERR_WRITE_FILE,
-                 fqorvStringFormat("Error: attempting to write to the raster file %s while it was open in read mode\n",
-                                   mFileName.c_str()));
-    if (theRowNbr < 1)
-        failWith(CQORV_ERR_WRITE_FILE,
-                 fqorvStringFormat("Error: attempting to write to the raster file %s a negative or null number of lines\n",
-                                   mFileName.c_str()));
+    refuseTransfer(true, theRowNbr);
     clampRows(theRowStart, theRowNbr, "Request to write line");
     if (theColEnd < 1 || theColEnd >= NrOfPixelsPerLine) theColEnd = NrOfPixelsPerLine - 1;
     if (theColStart < 0 || theColStart > theColEnd) {

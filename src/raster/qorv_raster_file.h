@@ -166,6 +166,7 @@ private:
     [[noreturn]] void failSeek(int theRowStart, bool theRead);
     bool seekAbsolute(int64_t theTarget, bool theOrdinary);
     void prepareTransfer(bool theWrite);
+    void refuseTransfer(bool theWrite, int theRowNbr);
     void clampRows(int& theRowStart, int theRowNbr, const char* theFirstWords);
     void swapPixels(uint8_t* theData, std::size_t theBytes) const;
     void writeQueue();
