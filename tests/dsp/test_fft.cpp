@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <cstring>
 #include <numbers>
 #include <vector>
 
@@ -37,6 +38,23 @@ TEST(Fft2D, TwoDimensionalAndColumnTransformsAgree)
     FftPlanColumns aColumns(r, c, FftDirection::Forward);
     aColumns.execute(b.data());
     for (int i = 0; i < r * c; i += 37) EXPECT_NEAR(std::abs(a[i] - b[i]), 0.0, 1e-3 * std::abs(a[0]) + 1e-3);
+}
+
+TEST(FftThreads, ThreadedPlansGiveBitIdenticalResults)
+{
+    const int r = 512, c = 256;
+    for (const bool aColumns : {false, true}) {
+        FftBuffer a(r * c), b(r * c);
+        for (int i = 0; i < r * c; ++i) a[i] = b[i] = fcomplex(std::sin(0.37f * i), std::cos(0.011f * i));
+        fqorvFftSetThreads(1);
+        if (aColumns) FftPlanColumns(r, c, FftDirection::Forward).execute(a.data());
+        else FftPlan2D(r, c, FftDirection::Forward).execute(a.data());
+        fqorvFftSetThreads(2);
+        if (aColumns) FftPlanColumns(r, c, FftDirection::Forward).execute(b.data());
+        else FftPlan2D(r, c, FftDirection::Forward).execute(b.data());
+        fqorvFftSetThreads(1);
+        EXPECT_EQ(std::memcmp(a.data(), b.data(), sizeof(fcomplex) * r * c), 0) << (aColumns ? "columns" : "2-D");
+    }
 }
 
 }  // namespace
