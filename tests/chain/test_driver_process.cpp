@@ -206,4 +206,28 @@ TEST(DriverProcess, PrfExtractionRecordsSegmentsAndKeepsTheOriginalHeaderOnce)
     EXPECT_FALSE(std::filesystem::exists(aArgs[0] + "_old.sml"));
 }
 
+TEST(DriverProcess, ASimulatedErsSceneRunsThroughTheBuiltStepsAndStopsAtTheFirstMissingOne)
+{
+    DriverSandbox aBox;
+    const auto aRaw = aBox.data() / "sim_raw";
+    const RunResult aSim = qtest::runProgram(qtest::binaryDir() / "qorvex_simulate",
+                                             {"--preset", "ers2", "--lines", "512", "--samples", "768", "--targets",
+                                              "grid:1x1", "--prf-change", "300:2800", "--quiet", "--out", aRaw.string(),
+                                              "--config", aBox.etc().string()},
+                                             {}, aBox.data());
+    ASSERT_EQ(aSim.mStatus, 0) << aSim.mStderr;
+    auto aArgs = DriverSandbox::defaultArguments(aRaw, aBox.data() / "sim_slc");
+    const RunResult aRun = aBox.run(aBox.writeArguments(aArgs));
+    expectFailureReported(aBox, aRun, 130560);
+    EXPECT_NE(qtest::readFile(aBox.workingFile()).find("step not built: SAR IQ raw data azimuth spectrum"),
+              std::string::npos);
+    // The PRF scan found the simulated change, and step 0 made the parameter file.
+    qtest::InProcessEnvironment aEnv;
+    auto aHeader = readHeader(aRaw.string() + "_hdr");
+    const CDescriptionField& aChanges = (*aHeader)["ChannelInfo.PRFChanges"];
+    ASSERT_EQ(aChanges.getNbrOfRows(), 2);
+    EXPECT_DOUBLE_EQ(aChanges.getDouble(1, 0), 300.0);
+    EXPECT_TRUE(std::filesystem::exists(aBox.data() / "sim_par.sml"));
+}
+
 }  // namespace
