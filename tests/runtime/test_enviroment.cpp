@@ -126,6 +126,27 @@ TEST(Banners, StartAndEndBannerGoToLogAndTrace)
     }
 }
 
+TEST(CloseAll, SuccessRemovesTheWorkingFileAndALogAboveAMillionBytesIsMovedAway)
+{
+    InProcessEnvironment aEnv;
+    const std::string aChunk(20000, 'x');  // the log formats into a buffer of 25000 bytes
+    for (int i = 0; i < 51; ++i) fdfLog("%s", aChunk.c_str());
+    fdfCloseAll(0, true, true);
+    EXPECT_FALSE(std::filesystem::exists(gWorkingFile));
+    EXPECT_FALSE(std::filesystem::exists(aEnv.workPath("work/Process.log")));
+    bool aMoved = false;
+    for (const auto& e : std::filesystem::directory_iterator(aEnv.work() / "work"))
+        aMoved |= e.path().filename().string().rfind("Process_", 0) == 0 && std::filesystem::file_size(e.path()) > 1000000;
+    EXPECT_TRUE(aMoved);
+
+    // A small log stays, and keeps its end banner and the success text.
+    aEnv.reinit();
+    fdfCloseAll(0, true, true);
+    const std::string aLog = aEnv.log();
+    EXPECT_NE(aLog.find("\n\nSUCCESSFUL\n\n"), std::string::npos);
+    EXPECT_NE(aLog.find("\nEND : " + std::string(CQORV_VERSION_TEXT)), std::string::npos);
+}
+
 TEST(DeferredDeletion, DeletesFlaggedEntriesOnly)
 {
     InProcessEnvironment aEnv;
