@@ -489,6 +489,18 @@ void CRasterFile::clampRows(int& theRowStart, int theRowNbr, const char* theFirs
         fdfTrace("%s %lld is outside the image!\n", theFirstWords, static_cast<long long>(aLast));
 }
 
+/// Reverses the bytes of each group of sizeof(W) bytes in place.
+template <typename W, typename Swap>
+void reverseGroups(uint8_t* theData, std::size_t theBytes, Swap theSwap)
+{
+    for (std::size_t i = 0; i + sizeof(W) <= theBytes; i += sizeof(W)) {
+        W v;
+        std::memcpy(&v, theData + i, sizeof(W));
+        v = theSwap(v);
+        std::memcpy(theData + i, &v, sizeof(W));
+    }
+}
+
 void CRasterFile::swapPixels(uint8_t* theData, std::size_t theBytes) const
 {
     const int aGroup = mBytesPerPixel / mDataNbr;
@@ -497,20 +509,10 @@ void CRasterFile::swapPixels(uint8_t* theData, std::size_t theBytes) const
         for (std::size_t i = 0; i + 1 < theBytes; i += 2) std::swap(theData[i], theData[i + 1]);
         break;
     case 4:
-        for (std::size_t i = 0; i + 3 < theBytes; i += 4) {
-            uint32_t v;
-            std::memcpy(&v, theData + i, 4);
-            v = __builtin_bswap32(v);
-            std::memcpy(theData + i, &v, 4);
-        }
+        reverseGroups<uint32_t>(theData, theBytes, [](uint32_t v) { return __builtin_bswap32(v); });
         break;
     case 8:
-        for (std::size_t i = 0; i + 7 < theBytes; i += 8) {
-            uint64_t v;
-            std::memcpy(&v, theData + i, 8);
-            v = __builtin_bswap64(v);
-            std::memcpy(theData + i, &v, 8);
-        }
+        reverseGroups<uint64_t>(theData, theBytes, [](uint64_t v) { return __builtin_bswap64(v); });
         break;
     default:
         break;
