@@ -5,11 +5,9 @@
 // a scaled result scales explicitly. A plan that cannot be made is failure 522240.
 #pragma once
 
-#include <complex>
 #include <cstddef>
 
-using fcomplex = std::complex<float>;
-using dcomplex = std::complex<double>;
+#include "qorv_complex.h"
 
 enum class FftDirection { Forward, Inverse };
 

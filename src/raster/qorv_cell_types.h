@@ -7,7 +7,7 @@
 
 #include <cstdint>
 
-#include "qorv_fft.h"  // fcomplex, dcomplex
+#include "qorv_complex.h"
 
 /// A complex sample of an integer cell type: real part first, as on disk.
 template <typename T>
