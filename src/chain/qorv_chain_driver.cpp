@@ -1,7 +1,9 @@
 #include "qorv_chain_driver.h"
 
 #include <cstring>
+#include <filesystem>
 #include <memory>
+#include <set>
 
 #include "qorv_enviroment.h"
 #include "qorv_errors.h"
@@ -76,8 +78,13 @@ std::vector<std::string> fdfReadArgumentsFile(const std::string& theCommandLine)
         if (!fqorvFileExists(aPath)) QORV_FATAL(CQORV_ERR_MISSING_FILE, theCommandLine.c_str());
     }
     std::vector<std::string> aLines;
-    if (!fqorvReadTextLines(aPath.c_str(), aLines) || aLines.size() < 2)
-        QORV_FATAL(CQORV_ERR_MISSING_FILE, theCommandLine.c_str());
+    const CQorvTextRead aRead = fqorvReadTextFile(aPath.c_str(), aLines);
+    if (aRead != CQorvTextRead::Ok && aRead != CQorvTextRead::Missing) {
+        // A NUL would cut a name short where the step opens it; a line without end is no argument.
+        fdfTrace("\nThe arguments file %s %s\n", aPath.c_str(), fqorvTextReadWords(aRead));
+        QORV_FATAL(CQORV_ERR_ARGUMENT_COUNT, theCommandLine.c_str());
+    }
+    if (aRead != CQorvTextRead::Ok || aLines.size() < 2) QORV_FATAL(CQORV_ERR_MISSING_FILE, theCommandLine.c_str());
     aLines.erase(aLines.begin());
     return aLines;
 }
@@ -98,16 +105,55 @@ std::vector<int> CChainRun::stepList() const
                             dopplerAmbiguity(), autofocus(), tiff(), nbrOfFiles());
 }
 
+std::string CChainRun::productRoot(int theFileIndex) const
+{
+    // A single input file takes argument 2; the products of a list file, even of a one-line
+    // list, are named from their own file names.
+    if (!mFromList) return fqorvCutSuffix(arg(2), focus() ? "_slc" : "_pwr");
+    const std::string& aInput = mFileList[static_cast<std::size_t>(theFileIndex)];
+    return fqorvCutSuffix(fqorvCutSuffix(fqorvCutSuffix(aInput, "_raw"), "_slc"), "_pwr");
+}
+
+namespace {
+
+/// A file's identity for the overwrite check: the absolute, lexically normal path of its name
+/// without the header endings, so that a raster and its header count as one.
+std::string fileIdentity(const std::string& theName)
+{
+    std::error_code aError;
+    const std::string aBase = fqorvCutSuffix(fqorvCutSuffix(theName, "_hdr"), ".sml");
+    std::filesystem::path aPath = std::filesystem::absolute(aBase, aError);
+    if (aError) aPath = aBase;
+    return aPath.lexically_normal().string();
+}
+
+}  // namespace
+
+void CChainRun::checkProductNames() const
+{
+    std::set<std::string> aInputs;
+    for (const std::string& aFile : mFileList) aInputs.insert(fileIdentity(aFile));
+    if (mFromList) aInputs.insert(fileIdentity(mArgs[0]));
+    static const char* const CPRODUCT_SUFFIXES[] = {"_par", "_azsp", "_rc", "_slc", "_pwr", "_pwr.tif", "_slc.tif",
+                                                    "_rc__amb1_mli", "_rc__amb2_mli", "_ref_rc"};
+    for (int aFile = 0; aFile < nbrOfFiles(); ++aFile) {
+        const std::string aRoot = productRoot(aFile);
+        for (const char* aSuffix : CPRODUCT_SUFFIXES) {
+            const std::string aProduct = aRoot + aSuffix;
+            if (aInputs.count(fileIdentity(aProduct)) == 0) continue;
+            fdfTrace("\nThe product %s would overwrite an input of this run\n", aProduct.c_str());
+            QORV_FATAL(CQORV_ERR_ARGUMENT_COUNT, aProduct.c_str());
+        }
+    }
+}
+
 void CChainRun::setRoot()
 {
     mCurrentInput = mFileList[static_cast<std::size_t>(mFileIndex)];
-    // A single input file takes argument 2; the products of a list file, even of a one-line
-    // list, are named from their own file names.
+    mRoot = productRoot(mFileIndex);
     if (!mFromList) {
-        mRoot = fqorvCutSuffix(arg(2), focus() ? "_slc" : "_pwr");
         mKeepRoot = mRoot;
     } else {
-        mRoot = fqorvCutSuffix(fqorvCutSuffix(fqorvCutSuffix(mCurrentInput, "_raw"), "_slc"), "_pwr");
         if (mFileIndex == 0) {
             mKeepRoot = mRoot;
             mRefRoot = mRoot + "_ref";
@@ -228,14 +274,21 @@ std::unique_ptr<CChainRun> prepareRun(const std::string& theCommandLine)
     std::vector<std::string> aFileList;
     if (fqorvEndsWith(aArgs[0], CQORV_FOC_LIST_SUFFIX)) {
         std::vector<std::string> aLines;
-        if (!fqorvReadTextLines(aArgs[0].c_str(), aLines)) QORV_FATAL(CQORV_ERR_MISSING_FILE, aArgs[0].c_str());
+        const CQorvTextRead aRead = fqorvReadTextFile(aArgs[0].c_str(), aLines);
+        if (aRead == CQorvTextRead::Missing) QORV_FATAL(CQORV_ERR_MISSING_FILE, aArgs[0].c_str());
+        if (aRead != CQorvTextRead::Ok) {
+            fdfTrace("\nThe list file %s %s\n", aArgs[0].c_str(), fqorvTextReadWords(aRead));
+            QORV_FATAL(CQORV_ERR_ARGUMENT_COUNT, aArgs[0].c_str());
+        }
         for (std::string& aLine : aLines)
             if (!aLine.empty()) aFileList.push_back(std::move(aLine));
         if (aFileList.empty()) QORV_FATAL(CQORV_ERR_ARGUMENT_COUNT, aArgs[0].c_str());
     } else {
         aFileList.push_back(aArgs[0]);
     }
-    return std::make_unique<CChainRun>(std::move(aArgs), std::move(aFileList));
+    auto aRun = std::make_unique<CChainRun>(std::move(aArgs), std::move(aFileList));
+    aRun->checkProductNames();
+    return aRun;
 }
 
 int runChain(const std::string& theCommandLine, const CStepRow* theTable, long long theStart)

@@ -64,6 +64,12 @@ public:
     /// moves on.
     std::vector<std::string> stepArguments(int theStep);
 
+    /// The root of the products of input file theFileIndex (argument 2, or the file's own name).
+    std::string productRoot(int theFileIndex) const;
+    /// Refuses (456962, the product's name) a run in which a product or its header would stand in
+    /// place of one of the run's inputs: the listed files, the list file and their headers.
+    void checkProductNames() const;
+
     /// Runs the steps of a list through a table; returns the status of the last step run.
     int runStepList(const CStepRow* theTable, const std::vector<int>& theSteps);
 

@@ -186,7 +186,17 @@ void CRasterFile::takeGeometry(const CRasterFileParam& theParam)
     mLinePosition = 0;
 
     mSwap = theParam.mByteOrderMSBF != fqorvMachineIsMSBF();
-    mRecordLen = getLineBytes() + mRowPrefix + mRowSuffix;
+    // A record (prefix, line, suffix) and the header stay well inside what an int and the memory of
+    // one line buffer hold; sums of hostile sizes are checked in 64 bits before they are used.
+    const int64_t aLineBytes = mCellType == CQORV_CELL_BIT ? (static_cast<int64_t>(NrOfPixelsPerLine) + 7) / 8 * mBytesPerPixel
+                                                            : static_cast<int64_t>(NrOfPixelsPerLine) * mBytesPerPixel;
+    const int64_t aRecordLen = aLineBytes + mRowPrefix + mRowSuffix;
+    if (aRecordLen > CQORV_RASTER_MAX_RECORD_BYTES || aRecordLen <= 0)
+        failWith(CQORV_ERR_RASTER_ACCESS,
+                 fqorvStringFormat("record of %lld bytes (prefix %d, line %lld, suffix %d) is over the limit of %lld\n",
+                                   static_cast<long long>(aRecordLen), mRowPrefix, static_cast<long long>(aLineBytes),
+                                   mRowSuffix, static_cast<long long>(CQORV_RASTER_MAX_RECORD_BYTES)));
+    mRecordLen = static_cast<int>(aRecordLen);
     allocateBytes(mWorkBuffer, static_cast<std::size_t>(mRecordLen));
     mMaxLineSeek = static_cast<int>(CQORV_RF_SEEK_THRESHOLD / mRecordLen);
     mRealScaleFactor = theParam.mRealScaleFactor;

@@ -26,6 +26,8 @@ inline constexpr int CQORV_RF_OPEN_TIFF_WRITE = 5;
 
 /// Bound of the number of lines and of the number of pixels of a raster.
 inline constexpr int CQORV_RASTER_FILE_MAX_ROWS = 900000;
+/// Longest record (prefix, line and suffix) in bytes: 64 MiB, four times the widest line of 16-byte cells.
+inline constexpr long long CQORV_RASTER_MAX_RECORD_BYTES = 1LL << 26;
 /// Byte position from which only the descriptor seek may move the stream.
 inline constexpr int64_t CQORV_RF_SEEK_THRESHOLD = 2000000000;
 

@@ -122,30 +122,71 @@ bool fqorvFileExists(const char* a)
     return aExists;
 }
 
-bool fqorvReadTextLines(const char* thePath, std::vector<std::string>& theLines)
+namespace {
+
+/// Blanks cut at both ends, the text from a carriage return on dropped.
+void trimTextLine(std::string& theLine)
+{
+    const std::size_t aCr = theLine.find('\r');
+    if (aCr != std::string::npos) theLine.resize(aCr);
+    const std::size_t aFirst = theLine.find_first_not_of(' ');
+    if (aFirst == std::string::npos) {
+        theLine.clear();
+        return;
+    }
+    const std::size_t aLast = theLine.find_last_not_of(' ');
+    theLine = theLine.substr(aFirst, aLast - aFirst + 1);
+}
+
+}  // namespace
+
+CQorvTextRead fqorvReadTextFile(const char* thePath, std::vector<std::string>& theLines)
 {
     theLines.clear();
-    if (!thePath) return false;
-    std::ifstream aIn(thePath, std::ios::binary);
-    if (!aIn) return false;
-    constexpr std::size_t aLimit = 10000;
+    FILE* aFile = thePath ? std::fopen(thePath, "rb") : nullptr;
+    if (!aFile) return CQorvTextRead::Missing;
+    CQorvTextRead aResult = CQorvTextRead::Ok;
+    std::size_t aTotal = 0;
     std::string aLine;
-    while (std::getline(aIn, aLine)) {
-        if (aLine.size() > aLimit) aLine.resize(aLimit);
-        // A carriage return ends the line where it stands.
-        const std::size_t aCr = aLine.find('\r');
-        if (aCr != std::string::npos) aLine.resize(aCr);
-        const std::size_t aFirst = aLine.find_first_not_of(' ');
-        if (aFirst == std::string::npos) {
+    bool aPending = false;
+    for (int c; aResult == CQorvTextRead::Ok;) {
+        c = getc_unlocked(aFile);
+        if (c == EOF || c == '\n') {
+            if (c == EOF && !aPending) break;
+            trimTextLine(aLine);
+            if (!aLine.empty() && aLine[0] == '#') break;
+            theLines.push_back(std::move(aLine));
             aLine.clear();
-        } else {
-            const std::size_t aLast = aLine.find_last_not_of(' ');
-            aLine = aLine.substr(aFirst, aLast - aFirst + 1);
+            aPending = false;
+            if (c == EOF) break;
+            continue;
         }
-        if (!aLine.empty() && aLine[0] == '#') break;
-        theLines.push_back(aLine);
+        aPending = true;
+        if (c == '\0') aResult = CQorvTextRead::NulByte;
+        else if (++aTotal > CQORV_TEXT_FILE_LIMIT) aResult = CQorvTextRead::TooLarge;
+        else if (aLine.size() >= CQORV_TEXT_LINE_LIMIT) aResult = CQorvTextRead::LineTooLong;
+        else aLine += static_cast<char>(c);
     }
-    return true;
+    std::fclose(aFile);
+    if (aResult != CQorvTextRead::Ok) theLines.clear();
+    return aResult;
+}
+
+bool fqorvReadTextLines(const char* thePath, std::vector<std::string>& theLines)
+{
+    return fqorvReadTextFile(thePath, theLines) == CQorvTextRead::Ok;
+}
+
+const char* fqorvTextReadWords(CQorvTextRead theRead)
+{
+    switch (theRead) {
+    case CQorvTextRead::Ok: return "read";
+    case CQorvTextRead::Missing: return "cannot be opened";
+    case CQorvTextRead::NulByte: return "holds a NUL byte";
+    case CQorvTextRead::LineTooLong: return "holds a line over 10000 characters";
+    case CQorvTextRead::TooLarge: return "is over 16 MiB";
+    }
+    return "";
 }
 
 namespace NQORV_UTILITY {

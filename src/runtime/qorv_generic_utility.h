@@ -40,10 +40,23 @@ std::string fqorvCutSuffix(std::string a, const std::string& b);
 inline bool fqorvFileExists(const std::string& a) { return fqorvFileExists(a.c_str()); }
 std::string fqorvStringFormat(const char* format, ...) __attribute__((format(printf, 1, 2)));
 
-/// Reads a text file line by line (line limit 10000 characters) for arguments, lists and catalogues.
-/// Blanks (only ' ') are cut at both ends, a carriage return ends a line where it stands, and a line
-/// that begins with '#' ends the reading. Returns false when the file cannot be opened.
+/// What fqorvReadTextFile found.
+enum class CQorvTextRead { Ok, Missing, NulByte, LineTooLong, TooLarge };
+
+/// Longest line of a text file for arguments, lists and catalogues, in characters.
+inline constexpr std::size_t CQORV_TEXT_LINE_LIMIT = 10000;
+/// Most bytes read from such a file: 16 MiB.
+inline constexpr std::size_t CQORV_TEXT_FILE_LIMIT = 1u << 24;
+
+/// Reads a text file line by line for arguments, lists and catalogues. Blanks (only ' ') are cut
+/// at both ends, a carriage return ends a line where it stands, and a line that begins with '#'
+/// ends the reading. Reading is bounded: a NUL byte, a line over CQORV_TEXT_LINE_LIMIT characters
+/// or more than CQORV_TEXT_FILE_LIMIT bytes end it with that finding and no lines.
+CQorvTextRead fqorvReadTextFile(const char* thePath, std::vector<std::string>& theLines);
+/// The same; false for anything but a clean read.
 bool fqorvReadTextLines(const char* thePath, std::vector<std::string>& theLines);
+/// The finding in words ("holds a NUL byte", ...).
+const char* fqorvTextReadWords(CQorvTextRead theRead);
 
 namespace NQORV_UTILITY {
 

@@ -716,12 +716,23 @@ void fSetFromNode(const CQorvXmlTree& theTree, int theNode, CDescriptionField& t
     }
 }
 
-/// A count attribute of a wrapper element; a missing or wrong one is a wrongly built field.
+/// Elements nested in a node: the most values that a count attribute of that node can describe.
+long long fNodesInside(const CQorvXmlTree& theTree, int theNode)
+{
+    return static_cast<long long>(theTree.mNodes[static_cast<std::size_t>(theNode)].mEnd) - theNode - 1;
+}
+
+/// A count attribute of a wrapper element; a missing or wrong one is a wrongly built field, and so is
+/// a count above the elements the wrapper holds (the storage is sized from what the file holds).
 int fCountAttribute(const CQorvXmlTree& theTree, int theNode, const char* theName, const CDescriptionField& theField)
 {
     const char* aText = theTree.attribute(theNode, theName);
     int aValue = 0;
     if (!aText || !fqorvParseInteger(aText, aValue) || aValue < 0) fBadValue(theField);
+    if (aValue > fNodesInside(theTree, theNode)) {
+        fdfTrace("%s = %d but the element holds %lld\n", theName, aValue, fNodesInside(theTree, theNode));
+        fBadValue(theField);
+    }
     return aValue;
 }
 
@@ -748,6 +759,7 @@ void fReadMatrix(const CQorvXmlTree& theTree, int theNode, CDescriptionField& th
     const int aWrapper = fWrapper(theTree, theNode, theField);
     const int aRows = fCountAttribute(theTree, aWrapper, "NumberOfRows", theField);
     const int aCols = fCountAttribute(theTree, aWrapper, "NumberOfColumns", theField);
+    if (static_cast<long long>(aRows) * aCols > fNodesInside(theTree, aWrapper)) fBadValue(theField);
     theField.resize(aRows, aCols);
     int r = 0;
     const int aEnd = theTree.mNodes[static_cast<std::size_t>(aWrapper)].mEnd;

@@ -8,6 +8,9 @@
 
 namespace {
 
+/// Arrays and objects nest at most this deep: the parser recurses once per level.
+constexpr int CJSON_MAX_DEPTH = 200;
+
 class Parser {
 public:
     explicit Parser(const std::string& t) : s(t) {}
@@ -17,8 +20,13 @@ public:
         ws();
         if (p >= s.size()) fail("unexpected end");
         const char c = s[p];
-        if (c == '{') return object();
-        if (c == '[') return array();
+        if (c == '{' || c == '[') {
+            if (depth >= CJSON_MAX_DEPTH) fail("nesting deeper than 200 levels");
+            ++depth;
+            CJson v = c == '{' ? object() : array();
+            --depth;
+            return v;
+        }
         if (c == '"') return CJson(str());
         if (c == 't') { word("true"); return CJson(true); }
         if (c == 'f') { word("false"); return CJson(false); }
@@ -40,6 +48,13 @@ private:
     void ws()
     {
         while (p < s.size() && (s[p] == ' ' || s[p] == '\n' || s[p] == '\r' || s[p] == '\t')) ++p;
+    }
+    static int hexDigit(char c)
+    {
+        if (c >= '0' && c <= '9') return c - '0';
+        if (c >= 'a' && c <= 'f') return c - 'a' + 10;
+        if (c >= 'A' && c <= 'F') return c - 'A' + 10;
+        return -1;
     }
     void word(const char* w)
     {
@@ -73,9 +88,12 @@ private:
             case 'b': out += '\b'; break;
             case 'f': out += '\f'; break;
             case 'u': {
-                if (p + 4 > s.size()) fail("bad unicode escape");
-                const unsigned cp = static_cast<unsigned>(std::stoul(s.substr(p, 4), nullptr, 16));
-                p += 4;
+                unsigned cp = 0;
+                for (int k = 0; k < 4; ++k, ++p) {
+                    const int h = p < s.size() ? hexDigit(s[p]) : -1;
+                    if (h < 0) fail("bad unicode escape");
+                    cp = cp * 16 + static_cast<unsigned>(h);
+                }
                 if (cp < 0x80) out += static_cast<char>(cp);
                 else if (cp < 0x800) { out += static_cast<char>(0xC0 | (cp >> 6)); out += static_cast<char>(0x80 | (cp & 0x3F)); }
                 else { out += static_cast<char>(0xE0 | (cp >> 12)); out += static_cast<char>(0x80 | ((cp >> 6) & 0x3F)); out += static_cast<char>(0x80 | (cp & 0x3F)); }
@@ -125,6 +143,7 @@ private:
 
     const std::string& s;
     std::size_t p = 0;
+    int depth = 0;
 };
 
 void escape(std::string& out, const std::string& v)
