@@ -14,6 +14,7 @@
 #include "qorv_identifiers.h"
 #include "qorv_progress.h"
 #include "qorv_raster_file.h"
+#include "qorv_store_io.h"
 
 namespace {
 
@@ -106,6 +107,17 @@ void setPrfFromExtracted(CDescriptionHeader& theHeader)
     aPrf.setValue(0, aExtracted);
 }
 
+/// The header as it came is kept once, as a byte copy of the file that was read ("<input>.sml" to
+/// "<input>_old.sml", an old text "<input>_hdr" to "<input>_old_hdr"), before anything rewrites it.
+void keepOriginalHeader(const std::string& theInput)
+{
+    if (fqorvFileExists(theInput + "_old_hdr") || fqorvFileExists(theInput + "_old.sml")) return;
+    const bool aXml = fqorvFileExists(theInput + ".sml");
+    const std::string aFrom = theInput + (aXml ? ".sml" : "_hdr");
+    const std::string aTo = theInput + (aXml ? "_old.sml" : "_old_hdr");
+    if (!fqorvCopyAtomically(aFrom, aTo)) QORV_FATAL(CQORV_ERR_WRITE_FILE, aTo.c_str());
+}
+
 }  // namespace
 
 void fdfExtractPrfChanges(const char* theInput)
@@ -131,12 +143,8 @@ void fdfExtractPrfChanges(const char* theInput)
     CRasterFile aRaster;
     aRaster.openRead(aParam);
 
+    keepOriginalHeader(aInput);
     setPrfFromExtracted(*aHeader);
-    const std::string aOldHeader = aInput + "_old_hdr";
-    if (!fqorvFileExists(aOldHeader) && !fqorvFileExists(aInput + "_old.sml")) {
-        // The header as it came is kept once.
-        if (!aHeader->write(aOldHeader.c_str(), false, false)) QORV_FATAL(CQORV_ERR_WRITE_FILE, aOldHeader.c_str());
-    }
 
     fdfSetTitle("Extract PRF");
     getAndSetPerc(-1, 0, fdfGetTitle());

@@ -264,13 +264,7 @@ void writeRasterHeaderEnvi(const char* thePath, const char* theType)
     tailLines(aText, *aHeader);
 
     const std::string aEnviName = fqorvEnviHeaderName(thePath);
-    FILE* aFile = std::fopen(aEnviName.c_str(), "w");
-    if (aFile == nullptr) {
-        fdfTrace("Error: cannot create the file: %s  errno = %d\n", aEnviName.c_str(), errno);
-        QORV_FATAL(CQORV_ERR_CREATE_FILE, aEnviName.c_str());
-    }
-    const bool aWritten = std::fwrite(aText.data(), 1, aText.size(), aFile) == aText.size();
-    if (std::fclose(aFile) != 0 || !aWritten) {
+    if (!fqorvWriteTextAtomically(aEnviName, aText)) {
         fdfTrace("Error: cannot write the file: %s  errno = %d\n", aEnviName.c_str(), errno);
         QORV_FATAL(CQORV_ERR_CREATE_FILE, aEnviName.c_str());
     }

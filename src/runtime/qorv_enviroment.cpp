@@ -140,6 +140,13 @@ void readConfiguration(const std::string& thePath, const std::string& theEnvWork
             std::fclose(aFile);
             QORV_FATAL(CQORV_ERR_SETTING_MISSING, nullptr);
         }
+        // A line over 511 characters would be read as two and shift every later setting.
+        const std::size_t aLen = std::strlen(aBuffer);
+        if (aLen == sizeof aBuffer - 1 && aBuffer[aLen - 1] != '\n') {
+            std::fclose(aFile);
+            fdfTrace("Configuration line %d of %s is over 511 characters\n", aLine + 1, thePath.c_str());
+            QORV_FATAL(CQORV_ERR_SETTING_MISSING, thePath.c_str());
+        }
         const char* aKey = CQORV_CONFIG_KEYS[aLine];
         if (!aKey) continue;
         std::string aValue = cleanConfigLine(aBuffer);

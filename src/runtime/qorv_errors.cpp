@@ -110,10 +110,7 @@ std::string resultBlock(int theId, const std::vector<const char*>& theParameters
 
 bool writeWholeFile(const std::string& thePath, const std::string& theText)
 {
-    FILE* aFile = std::fopen(thePath.c_str(), "w");
-    if (!aFile) return false;
-    const bool aOk = std::fputs(theText.c_str(), aFile) >= 0;
-    return std::fclose(aFile) == 0 && aOk;
+    return fqorvWriteTextAtomically(thePath, theText);
 }
 
 /// Reads a line of at most theMax characters, without its line feed.
@@ -127,12 +124,15 @@ std::string readLine(FILE* theFile, std::size_t theMax)
 }
 
 /// Rewrites the working file: -1 (or -2), the kept title line, then the block.
-bool rewriteWorkingFile(int theId, const std::string& theBlock, const std::vector<const char*>& theParameters)
+bool rewriteWorkingFile(int theId, const std::string& theBlock)
 {
     FILE* aFile = nullptr;
     for (int aTry = 0; aTry < CQORV_RESULT_FILE_TRIES && !aFile; ++aTry) {
+        errno = 0;
         aFile = std::fopen(gWorkingFile.c_str(), "r+");
-        if (!aFile) std::this_thread::sleep_for(std::chrono::milliseconds(fdfProgressRetrySleepMs()));
+        if (aFile) break;
+        if (!fdfOpenFailureMayPass(errno)) break;  // cannot be written at all: no waiting
+        std::this_thread::sleep_for(std::chrono::milliseconds(fdfProgressRetrySleepMs()));
     }
     if (!aFile) return false;
     readLine(aFile, CQORV_CATALOG_TEXT_LEN);
@@ -144,6 +144,12 @@ bool rewriteWorkingFile(int theId, const std::string& theBlock, const std::vecto
     // The old content may have been longer: nothing of it must stand behind the new text.
     if (ftruncate(fileno(aFile), static_cast<off_t>(aText.size())) != 0) { /* the text stands; ignore */ }
     std::fclose(aFile);
+    return true;
+}
+
+/// The failure's texts on the standard error stream, whatever became of the result files.
+void reportOnStandardError(int theId, const std::vector<const char*>& theParameters)
+{
     char aPrimary[CQORV_CATALOG_TEXT_LEN + 64];
     char aSecondary[CQORV_CATALOG_TEXT_LEN + 64];
     gErrorCatalog.getPrimaryText(theId, aPrimary);
@@ -151,7 +157,6 @@ bool rewriteWorkingFile(int theId, const std::string& theBlock, const std::vecto
     std::cerr << aPrimary << "\n" << aSecondary << "\n";
     for (const char* p : theParameters) std::cerr << (p ? p : "") << "\n";
     std::cerr.flush();
-    return true;
 }
 
 }  // namespace
@@ -272,8 +277,9 @@ bool writeResultFiles(int theId, const char* theParameter, ...)
 
     const std::string aBlock = resultBlock(theId, aParameters);
     writeWholeFile(gWorkingFile + "_error", "-1\n" + aBlock);
-    if (rewriteWorkingFile(theId, aBlock, aParameters)) return true;
-    return writeWholeFile(gWorkingFile + "_tmp", aBlock);
+    const bool aOk = rewriteWorkingFile(theId, aBlock) || writeWholeFile(gWorkingFile + "_tmp", aBlock);
+    reportOnStandardError(theId, aParameters);
+    return aOk;
 }
 
 void fqorvFatal(int theId, const char* theParameter, const char* theFile, int theLine)

@@ -2,6 +2,7 @@
 
 #include <strings.h>
 #include <sys/stat.h>
+#include <unistd.h>
 
 #include <cerrno>
 #include <cstdarg>
@@ -139,6 +140,19 @@ void trimTextLine(std::string& theLine)
 }
 
 }  // namespace
+
+bool fqorvWriteTextAtomically(const std::string& thePath, const std::string& theText)
+{
+    const std::string aTemporary = thePath + ".tmp" + std::to_string(static_cast<long>(::getpid()));
+    FILE* aFile = std::fopen(aTemporary.c_str(), "wb");
+    if (!aFile) return false;
+    bool aOk = std::fwrite(theText.data(), 1, theText.size(), aFile) == theText.size();
+    aOk = std::fflush(aFile) == 0 && aOk;
+    aOk = std::fclose(aFile) == 0 && aOk;
+    if (aOk && std::rename(aTemporary.c_str(), thePath.c_str()) != 0) aOk = false;
+    if (!aOk) std::remove(aTemporary.c_str());
+    return aOk;
+}
 
 CQorvTextRead fqorvReadTextFile(const char* thePath, std::vector<std::string>& theLines)
 {

@@ -40,6 +40,10 @@ std::string fqorvCutSuffix(std::string a, const std::string& b);
 inline bool fqorvFileExists(const std::string& a) { return fqorvFileExists(a.c_str()); }
 std::string fqorvStringFormat(const char* format, ...) __attribute__((format(printf, 1, 2)));
 
+/// Writes a whole text under a temporary name beside thePath and renames it into place, so that a
+/// full or failing disk leaves the old file (or none), never an empty or cut one. False on failure.
+bool fqorvWriteTextAtomically(const std::string& thePath, const std::string& theText);
+
 /// What fqorvReadTextFile found.
 enum class CQorvTextRead { Ok, Missing, NulByte, LineTooLong, TooLarge };
 

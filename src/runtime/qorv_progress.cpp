@@ -1,5 +1,6 @@
 #include "qorv_progress.h"
 
+#include <cerrno>
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
@@ -58,7 +59,25 @@ void writeProgress(FILE* theFile, int thePercent, const std::string& theTitle)
     if (ftruncate(fileno(theFile), static_cast<off_t>(aText.size())) != 0) { /* the lines stand */ }
 }
 
+/// A working file that cannot be written still carries the operator's stop: read it, publish nothing.
+bool readStopOnly()
+{
+    FILE* aFile = std::fopen(gWorkingFile.c_str(), "r");
+    if (!aFile) return true;
+    const std::string aFirst = readLine(aFile);
+    std::fclose(aFile);
+    int aValue = 0;
+    if (std::sscanf(aFirst.c_str(), "%i", &aValue) == 1 && aValue > 100) QORV_FATAL(CQORV_ERR_OPERATOR_STOP, nullptr);
+    return true;
+}
+
 }  // namespace
+
+bool fdfOpenFailureMayPass(int theErrno)
+{
+    return theErrno == EBUSY || theErrno == ETXTBSY || theErrno == EAGAIN || theErrno == EINTR || theErrno == EMFILE ||
+           theErrno == ENFILE || theErrno == ENOMEM || theErrno == 0;
+}
 
 void fdfSetProgressRetrySleepMs(int theMilliseconds) { gRetrySleepMs = theMilliseconds < 0 ? 0 : theMilliseconds; }
 int fdfProgressRetrySleepMs() { return gRetrySleepMs; }
@@ -73,9 +92,12 @@ bool getAndSetPerc(int theOldPercent, int theNewPercent, const char* theTitle)
         fdfTrace("getAndSetPerc - Not found the file : %s\n", gWorkingFile.c_str());
         FILE* aFile = nullptr;
         for (int aTry = 0; aTry < CQORV_PROGRESS_TRIES && !aFile; ++aTry) {
+            errno = 0;
             aFile = std::fopen(gWorkingFile.c_str(), "w");
             if (!aFile) {
+                const int aErrno = errno;
                 fdfTrace("%d File %s attempt create : \n", aTry, gWorkingFile.c_str());
+                if (!fdfOpenFailureMayPass(aErrno)) break;
                 retrySleep();
             }
         }
@@ -90,9 +112,12 @@ bool getAndSetPerc(int theOldPercent, int theNewPercent, const char* theTitle)
 
     FILE* aFile = nullptr;
     for (int aTry = 0; aTry < CQORV_PROGRESS_TRIES && !aFile; ++aTry) {
+        errno = 0;
         aFile = std::fopen(gWorkingFile.c_str(), "r+");
         if (aFile) break;
+        const int aErrno = errno;
         fdfTrace("%d File %s attempt open :  RDSTATE = %s\n", aTry, gWorkingFile.c_str(), streamStateWords(aFile));
+        if (!fdfOpenFailureMayPass(aErrno)) return readStopOnly();  // cannot be written at all: no waiting
         if (aTry + 1 >= CQORV_PROGRESS_GIVE_UP) return true;  // held by the calling program: give up quietly
         retrySleep();
     }

@@ -17,3 +17,8 @@ void fdfProgress(int& theLastPercent, long long theDone, long long theTotal);
 /// (1000 in a run; in-process tests shorten it).
 void fdfSetProgressRetrySleepMs(int theMilliseconds);
 int fdfProgressRetrySleepMs();
+
+/// Whether an open that failed with theErrno may succeed on a later try (the calling program holds
+/// the file for a moment). A file that cannot be written at all (no permission, a read-only file
+/// system, a directory, a missing directory) is not retried.
+bool fdfOpenFailureMayPass(int theErrno);

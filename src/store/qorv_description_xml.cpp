@@ -201,18 +201,59 @@ std::string fqorvXmlUnescape(std::string_view theText)
     return aOut;
 }
 
+namespace {
+
+/// Bytes that the pre-pass rewrites before the parser sees them.
+bool fPrepassByte(unsigned char c) { return (c >= 0x80 && c <= 0xA4) || c == 0xE9 || c == 0xF1 || c == 0xFC || c == 0xF6 || c == 0xB0; }
+
+/// The pre-pass turns these single bytes into plain letters.
+bool fPrepassLetter(unsigned char c) { return c == 0xE9 || c == 0xF1 || c == 0xFC || c == 0xF6 || c == 0xB0; }
+
+/// Length of the UTF-8 character at theText[i] when it is well formed, allowed in XML and passes the
+/// pre-pass untouched; 0 otherwise.
+std::size_t fKeptUtf8Length(std::string_view theText, std::size_t i)
+{
+    const unsigned char c = static_cast<unsigned char>(theText[i]);
+    const std::size_t n = (c >= 0xC2 && c <= 0xDF) ? 2 : (c >= 0xE0 && c <= 0xEF) ? 3 : (c >= 0xF0 && c <= 0xF4) ? 4 : 0;
+    if (n == 0 || fPrepassByte(c) || i + n > theText.size()) return 0;
+    unsigned long aCode = c & (n == 2 ? 0x1F : n == 3 ? 0x0F : 0x07);
+    for (std::size_t k = 1; k < n; ++k) {
+        const unsigned char b = static_cast<unsigned char>(theText[i + k]);
+        if ((b & 0xC0) != 0x80 || fPrepassByte(b)) return 0;
+        aCode = (aCode << 6) | (b & 0x3F);
+    }
+    const unsigned long aLeast = n == 2 ? 0x80 : n == 3 ? 0x800 : 0x10000;
+    if (aCode < aLeast || aCode > 0x10FFFF || (aCode >= 0xD800 && aCode <= 0xDFFF) || aCode == 0xFFFE || aCode == 0xFFFF)
+        return 0;
+    return n;
+}
+
+}  // namespace
+
 std::string fqorvXmlEscape(std::string_view theText)
 {
     std::string aOut;
     aOut.reserve(theText.size() + 8);
-    for (const char c : theText) {
+    for (std::size_t i = 0; i < theText.size(); ++i) {
+        const char c = theText[i];
+        const unsigned char u = static_cast<unsigned char>(c);
         switch (c) {
-        case '&': aOut += "&amp;"; break;
-        case '<': aOut += "&lt;"; break;
-        case '>': aOut += "&gt;"; break;
-        case '"': aOut += "&quot;"; break;
-        case '\'': aOut += "&apos;"; break;
-        default: aOut += c; break;
+        case '&': aOut += "&amp;"; continue;
+        case '<': aOut += "&lt;"; continue;
+        case '>': aOut += "&gt;"; continue;
+        case '"': aOut += "&quot;"; continue;
+        case '\'': aOut += "&apos;"; continue;
+        default: break;
+        }
+        if (u < 0x20 && c != '\t' && c != '\n' && c != '\r') {
+            aOut += ' ';  // XML carries no control characters
+        } else if (u < 0x80 || fPrepassLetter(u)) {
+            aOut += c;
+        } else if (const std::size_t n = fKeptUtf8Length(theText, i)) {
+            aOut.append(theText.substr(i, n));
+            i += n - 1;
+        } else {
+            aOut += '?';  // a byte that would not come through the pre-pass and the parser
         }
     }
     return aOut;
@@ -648,6 +689,17 @@ bool fWriteUpdated(FILE* theFile, const std::vector<std::string>& theOldLines,
     return aSink.flush();
 }
 
+/// Whether a written header file parses and holds its root element (theContext: the root tag).
+bool fReadsBack(const std::string& theTemporary, const void* theContext)
+{
+    const auto aTree = fqorv_xml_parser(CQORV_XML_MAX_NODES_READ, CQORV_XML_MAX_DEPTH, theTemporary.c_str(),
+                                        static_cast<int>(CQORV_POOL_BUFFER_SIZE));
+    const std::string& aRootTag = *static_cast<const std::string*>(theContext);
+    if (aTree && aTree->find(aRootTag.c_str(), 0, static_cast<int>(aTree->mNodes.size())) >= 0) return true;
+    fdfTrace("The written header %s does not read back: it does not replace the old one\n", theTemporary.c_str());
+    return false;
+}
+
 }  // namespace
 
 bool CDescriptionHeader::writeXML(const char* thePath, bool theNewFile, bool theMandatory)
@@ -665,6 +717,7 @@ bool CDescriptionHeader::writeXML(const char* thePath, bool theNewFile, bool the
     std::vector<std::string> aOldLines;
     const bool aUpdate = !theNewFile && fqorvFileExists(aPath) && fqorvReadAllLines(aPath, aOldLines) &&
                          fRootClosingLine(aOldLines) > 0;
+    // A header is replaced only by a file that reads back.
     const bool aOk = !aPath.empty() && fqorvWriteAtomically(aPath, [&](FILE* theFile) {
         if (aUpdate) return fWriteUpdated(theFile, aOldLines, aSections);
         CXmlSink aSink(theFile);
@@ -673,7 +726,7 @@ bool CDescriptionHeader::writeXML(const char* thePath, bool theNewFile, bool the
         for (const CDescriptionSection* aSection : aSections) fWriteSection(aSink, *aSection);
         aSink.line(0, "</" + mRootTag + ">");
         return aSink.flush();
-    });
+    }, fReadsBack, &mRootTag);
     if (!aOk) {
         fdfTrace("Error while writing the header file %s\n", aPath.c_str());
         if (theMandatory) QORV_FATAL(CQORV_ERR_WRITE_FILE, aPath.c_str());

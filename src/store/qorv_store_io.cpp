@@ -39,11 +39,27 @@ std::string fqorvTemporaryName(const std::string& thePath)
     return thePath + ".tmp" + std::to_string(static_cast<long>(::getpid()));
 }
 
-bool fqorvFinishAtomicWrite(FILE* theFile, const std::string& theTemporary, const std::string& thePath, bool theOk)
+bool fqorvFinishAtomicWrite(FILE* theFile, const std::string& theTemporary, const std::string& thePath, bool theOk,
+                            QorvWrittenCheck theCheck, const void* theContext)
 {
     bool aOk = theOk && std::fflush(theFile) == 0 && !std::ferror(theFile);
     if (std::fclose(theFile) != 0) aOk = false;
+    if (aOk && theCheck && !theCheck(theTemporary, theContext)) aOk = false;
     if (aOk && std::rename(theTemporary.c_str(), thePath.c_str()) != 0) aOk = false;
     if (!aOk) std::remove(theTemporary.c_str());
     return aOk;
+}
+
+bool fqorvCopyAtomically(const std::string& theFrom, const std::string& theTo)
+{
+    FILE* aIn = std::fopen(theFrom.c_str(), "rb");
+    if (!aIn) return false;
+    CStdioFile aCloser(aIn);
+    return fqorvWriteAtomically(theTo, [&](FILE* theOut) {
+        char aBuffer[1 << 16];
+        std::size_t n;
+        while ((n = std::fread(aBuffer, 1, sizeof aBuffer, aIn)) > 0)
+            if (std::fwrite(aBuffer, 1, n, theOut) != n) return false;
+        return !std::ferror(aIn);
+    });
 }

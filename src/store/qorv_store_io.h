@@ -31,18 +31,25 @@ bool fqorvReadAllLines(const std::string& thePath, std::vector<std::string>& the
 
 /// The temporary name used by fqorvWriteAtomically.
 std::string fqorvTemporaryName(const std::string& thePath);
-/// Ends an atomic write: closes, renames into place on success, removes the temporary otherwise.
-bool fqorvFinishAtomicWrite(FILE* theFile, const std::string& theTemporary, const std::string& thePath, bool theOk);
+/// Checks a written temporary file before it takes the place of thePath; null checks nothing.
+using QorvWrittenCheck = bool (*)(const std::string& theTemporary, const void* theContext);
+/// Ends an atomic write: closes, checks, renames into place on success, removes the temporary otherwise.
+bool fqorvFinishAtomicWrite(FILE* theFile, const std::string& theTemporary, const std::string& thePath, bool theOk,
+                            QorvWrittenCheck theCheck = nullptr, const void* theContext = nullptr);
 
 /// Writes a file under a temporary name in the same directory and renames it into place, so that
 /// a failed write never leaves a truncated file in place of a good one. theBody(FILE*) writes the
-/// content and answers false on failure.
+/// content and answers false on failure; theCheck, when given, must accept the written file.
 template <typename Body>
-bool fqorvWriteAtomically(const std::string& thePath, Body&& theBody)
+bool fqorvWriteAtomically(const std::string& thePath, Body&& theBody, QorvWrittenCheck theCheck = nullptr,
+                          const void* theContext = nullptr)
 {
     const std::string aTemporary = fqorvTemporaryName(thePath);
     FILE* aFile = std::fopen(aTemporary.c_str(), "wb");
     if (!aFile) return false;
     const bool aOk = theBody(aFile);
-    return fqorvFinishAtomicWrite(aFile, aTemporary, thePath, aOk);
+    return fqorvFinishAtomicWrite(aFile, aTemporary, thePath, aOk, theCheck, theContext);
 }
+
+/// Copies a file byte for byte under a temporary name and renames the copy into place.
+bool fqorvCopyAtomically(const std::string& theFrom, const std::string& theTo);

@@ -87,6 +87,9 @@ TEST(DriverProcess, EnvironmentFailuresKeepTheirIds)
     const std::string aFull = qtest::readFile(aIni);
     qtest::writeFile(aIni, aFull.substr(0, aFull.rfind('\n', aFull.size() - 2) + 1));
     EXPECT_EQ(aBox.run(aArgs).mExitId, 783360);
+    // A line over 511 characters is refused, not split into two settings.
+    qtest::writeFile(aIni, std::string(600, '/') + aFull.substr(aFull.find('\n')));
+    EXPECT_EQ(aBox.run(aArgs).mExitId, 783360);
 }
 
 TEST(DriverProcess, MissingCatalogueIsAMissingFile)
@@ -231,3 +234,86 @@ TEST(DriverProcess, ASimulatedErsSceneRunsThroughTheBuiltStepsAndStopsAtTheFirst
 }
 
 }  // namespace
+
+// ------------------------------------------------------------------------------------------------
+// Hostile and broken input: a clean failure id, nothing destroyed, no hang.
+
+namespace {
+
+/// Replaces the first occurrence of theOld in a file.
+void replaceInFile(const std::filesystem::path& thePath, const std::string& theOld, const std::string& theNew)
+{
+    std::string aText = qtest::readFile(thePath);
+    const std::size_t aPos = aText.find(theOld);
+    ASSERT_NE(aPos, std::string::npos) << theOld;
+    qtest::writeFile(thePath, aText.replace(aPos, theOld.size(), theNew));
+}
+
+}  // namespace
+
+TEST(DriverProcess, ArgumentsWithANulByteOrAnEndlessLineAndProductsOverInputsAreRefused)
+{
+    DriverSandbox aBox;
+    const auto aRaw = makeRaw(aBox, "raw");
+    const std::string aHeader = qtest::readFile(aRaw.string() + ".sml");
+    // A NUL inside the output root would cut the parameter file's name down to the input's.
+    auto aArgs = DriverSandbox::defaultArguments(aRaw, aBox.data() / "x_slc");
+    aArgs[2] = aRaw.string() + std::string("\0x_slc", 6);
+    expectFailureReported(aBox, aBox.run(aBox.writeArguments(aArgs)), 456962);
+    EXPECT_EQ(qtest::readFile(aRaw.string() + ".sml"), aHeader);
+
+    aArgs = DriverSandbox::defaultArguments(aRaw, aBox.data() / "x_slc");
+    aArgs[8] = std::string(20000, 'a');
+    expectFailureReported(aBox, aBox.run(aBox.writeArguments(aArgs)), 456962);
+    // An endless arguments file is refused at its first byte, not read whole.
+    EXPECT_EQ(aBox.run("/dev/zero", {}, 60).mExitId, 456962);
+
+    // Output root "a_slc" makes the parameter file "a_par": the input itself.
+    const auto aPar = makeRaw(aBox, "a_par");
+    const std::string aParHeader = qtest::readFile(aPar.string() + ".sml");
+    const RunResult aOver = aBox.run(aBox.writeArguments(DriverSandbox::defaultArguments(aPar, aBox.data() / "a_slc")));
+    expectFailureReported(aBox, aOver, 456962);
+    EXPECT_EQ(qtest::readFile(aPar.string() + ".sml"), aParHeader);
+}
+
+TEST(DriverProcess, APrfScanOverTextsTheReaderCannotGiveBackKeepsAByteCopyAndAReadableHeader)
+{
+    DriverSandbox aBox;
+    const auto aRaw = makeRaw(aBox, "raw");
+    replaceInFile(aRaw.string() + ".sml", "<Chirp>UP_CHIRP</Chirp>", "<Chirp>UP####BIGA\x85_CHIRP</Chirp>");
+    const std::string aOriginal = qtest::readFile(aRaw.string() + ".sml");
+    auto aArgs = DriverSandbox::defaultArguments(aRaw, aBox.data() / "x_slc");
+    aArgs[1] = "NotOK";
+    aArgs[14] = "OK";  // the scan alone
+    const RunResult aRun = aBox.run(aBox.writeArguments(aArgs));
+    ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr;
+    EXPECT_EQ(qtest::readFile(aRaw.string() + "_old.sml"), aOriginal);
+    qtest::InProcessEnvironment aEnv;
+    auto aHeader = readHeader(aRaw.string() + "_hdr");
+    EXPECT_EQ((*aHeader)["ChannelInfo.PRFChanges"].getNbrOfRows(), 1);
+}
+
+TEST(DriverProcess, RecordSizesThatWrapAroundEndWithTheRastersFailureId)
+{
+    DriverSandbox aBox;
+    const auto aRaw = makeRaw(aBox, "raw");
+    // 128 bytes of line + prefix + suffix = 2^32: a 32-bit record length of zero.
+    replaceInFile(aRaw.string() + ".sml", "<RowPrefix>412</RowPrefix>", "<RowPrefix>2147483584</RowPrefix>");
+    replaceInFile(aRaw.string() + ".sml", "<RowSuffix>0</RowSuffix>", "<RowSuffix>2147483584</RowSuffix>");
+    expectFailureReported(aBox, aBox.run(aBox.writeArguments(DriverSandbox::defaultArguments(aRaw, aBox.data() / "x_slc"))),
+                          261121);
+}
+
+TEST(DriverProcess, AWorkingFileThatCannotBeWrittenEndsTheRunQuicklyWithTheIdOnStandardError)
+{
+    DriverSandbox aBox;
+    const auto aRaw = makeRaw(aBox, "raw");
+    std::filesystem::resize_file(aRaw, 20 * (412 + 128));  // the scan fails at line 20, after 20 percents
+    std::filesystem::create_directory(aBox.workingFile());
+    auto aArgs = DriverSandbox::defaultArguments(aRaw, aBox.data() / "x_slc");
+    aArgs[14] = "OK";
+    // With a pause at every percent this run would take a minute; it must end well inside the limit.
+    const RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 15);
+    EXPECT_EQ(aRun.mExitId, 261125) << aRun.mStderr;
+    EXPECT_NE(qtest::readFile(aBox.workingFile().string() + "_error").find("[EC : 261125]"), std::string::npos);
+}
