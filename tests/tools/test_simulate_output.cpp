@@ -259,6 +259,16 @@ TEST(SimTool, CommandLineExitsCleanlyOnHelpAndBadOptionsAndWritesAProduct)
                           aDir.path(), 60);
     EXPECT_EQ(r.mStatus, 2);
     EXPECT_NE(r.mStderr.find("Qorvex_configuration.ini"), std::string::npos);
+    // A scene file of 50 KB of nested brackets is refused, not followed down to a stack overflow;
+    // so is a broken escape.
+    qtest::writeFile(aDir / "deep.json", std::string(50000, '['));
+    r = qtest::runProgram(aTool, {"--scene", (aDir / "deep.json").string()}, {}, aDir.path(), 60);
+    EXPECT_EQ(r.mStatus, 2);
+    EXPECT_NE(r.mStderr.find("nesting deeper than 200 levels"), std::string::npos) << r.mStderr;
+    qtest::writeFile(aDir / "escape.json", "{\"a\": \"\\u+fff\"}");
+    r = qtest::runProgram(aTool, {"--scene", (aDir / "escape.json").string()}, {}, aDir.path(), 60);
+    EXPECT_EQ(r.mStatus, 2);
+    EXPECT_NE(r.mStderr.find("bad unicode escape"), std::string::npos) << r.mStderr;
 
     const std::string aRoot = (aDir / "tool_raw").string();
     r = qtest::runProgram(aTool,
