@@ -2,6 +2,9 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <filesystem>
+
+#include <unistd.h>
 
 #include "qorv_generic_utility.h"
 #include "qorvex_test_support.h"
@@ -66,6 +69,29 @@ TEST(TextLines, TrimsBlanksOnlyStopsAtHashAndEndsLinesAtCarriageReturn)
     ASSERT_TRUE(fqorvReadTextLines(aPath.c_str(), aLines));
     EXPECT_EQ(aLines, (std::vector<std::string>{"first", "two", "\tthree\t", "four", ""}));
     EXPECT_FALSE(fqorvReadTextLines((aDir / "none").c_str(), aLines));
+
+    // Bounded: a NUL byte or a line over 10000 characters ends the reading with no lines; what
+    // stands after the "#" line is never read.
+    qtest::writeFile(aPath, "a\n" + std::string("b\0c", 3) + "\n");
+    EXPECT_EQ(fqorvReadTextFile(aPath.c_str(), aLines), CQorvTextRead::NulByte);
+    EXPECT_TRUE(aLines.empty());
+    qtest::writeFile(aPath, "a\n" + std::string(10000, 'x') + "\n#\n" + std::string(20000, '\0'));
+    EXPECT_EQ(fqorvReadTextFile(aPath.c_str(), aLines), CQorvTextRead::Ok);
+    EXPECT_EQ(aLines.size(), 2u);
+    qtest::writeFile(aPath, "a\n" + std::string(10001, 'x'));
+    EXPECT_EQ(fqorvReadTextFile(aPath.c_str(), aLines), CQorvTextRead::LineTooLong);
+}
+
+// A whole text goes in place by a rename: a write that fails leaves the old file and no temporary.
+TEST(TextLines, AFailedAtomicWriteLeavesTheOldFile)
+{
+    qtest::TempDir aDir;
+    const auto aPath = aDir / "result_error";
+    ASSERT_TRUE(fqorvWriteTextAtomically(aPath.string(), "old\n"));
+    std::filesystem::create_directory(aPath.string() + ".tmp" + std::to_string(static_cast<long>(::getpid())));
+    EXPECT_FALSE(fqorvWriteTextAtomically(aPath.string(), "new\n"));
+    EXPECT_EQ(qtest::readFile(aPath), "old\n");
+    EXPECT_FALSE(fqorvWriteTextAtomically((aDir / "no_dir" / "x").string(), "new\n"));
 }
 
 TEST(Scalars, NintLargestPowerAndNullComparison)
