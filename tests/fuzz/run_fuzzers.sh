@@ -31,7 +31,7 @@ cmake --build "$build" -j "$(nproc)" --target "${targets[@]}"
 # Seeds: the project's own headers, key and mandatory files, arguments and JSON examples.
 seeds() {
   case "$1" in
-    xml_header) ls "$top"/tests/store/golden/*.sml ;;
+    xml_header) ls "$top"/tests/store/golden/*.sml "$top"/tests/fuzz/seeds/xml_header/* ;;
     text_header) ls "$top"/tests/store/golden/*_hdr ;;
     key_file) ls "$top"/share/qorvex/keys/*.key "$top"/tests/store/keys/*.key "$top"/share/qorvex/mandatory/* ;;
     arguments) ls "$top"/tests/fuzz/seeds/arguments/* ;;
