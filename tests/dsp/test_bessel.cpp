@@ -1,20 +1,39 @@
-// Bessel I0 against reference values and the Kaiser window's shape.
+// Bessel I0 against its power series in long double, and the Kaiser window's shape.
 #include <gtest/gtest.h>
+
+#include <algorithm>
+#include <cmath>
 
 #include "qorv_bessel.h"
 
 namespace {
 
-TEST(BesselI0, MatchesReferenceValuesOnBothSidesOfTheBreak)
+/// I0 by its power series sum (x/2)^(2k) / (k!)^2 in long double.
+long double seriesI0(long double x)
 {
-    // Reference values from the power series sum (x^2/4)^k / (k!)^2.
-    const std::pair<double, double> aRef[] = {{0.0, 1.0},         {1.0, 1.266065878},  {2.12, 2.481517983},
-                                              {3.7, 8.738617524},  {3.8, 9.516888026},  {4.538, 18.07623479},
-                                              {10.0, 2815.716628}};
-    for (const auto& [x, v] : aRef) {
-        EXPECT_NEAR(besselI0(x) / v, 1.0, 2e-4) << x;
-        EXPECT_DOUBLE_EQ(besselI0(-x), besselI0(x));
+    long double aSum = 1.0L, aTerm = 1.0L;
+    for (int k = 1; k < 5000 && aTerm > aSum * 1e-22L; ++k) {
+        aTerm *= (x / 2) * (x / 2) / (static_cast<long double>(k) * k);
+        aSum += aTerm;
     }
+    return aSum;
+}
+
+double relativeError(double x)
+{
+    return static_cast<double>(std::fabs(besselI0(x) / seriesI0(x) - 1.0L));
+}
+
+TEST(BesselI0, HoldsItsAccuracyOnBothSidesOfTheBreakAndForNegativeArguments)
+{
+    double aWorst = 0.0;
+    for (int i = 0; i <= 20000; ++i) {
+        const double x = i * 0.001;
+        aWorst = std::max({aWorst, relativeError(x), relativeError(-x)});
+    }
+    EXPECT_LT(aWorst, 2e-7);
+    for (double x = 20.0; x <= 40.0; x += 0.01) ASSERT_LT(relativeError(x), 2e-7) << x;
+    for (double x = 40.0; x <= 700.0; x += 0.1) ASSERT_LT(relativeError(x), 5e-7) << x;
 }
 
 TEST(Kaiser, SymmetricPeakOneAndEdgesOneOverI0Beta)

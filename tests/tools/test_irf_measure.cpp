@@ -5,7 +5,6 @@
 
 #include <gtest/gtest.h>
 
-#include "qorv_bessel.h"
 #include "qorv_irf_ideal.h"
 #include "qorv_irf_measure.h"
 #include "qorv_irf_report.h"

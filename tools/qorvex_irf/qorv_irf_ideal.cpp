@@ -3,11 +3,33 @@
 #include <algorithm>
 #include <cmath>
 
-#include "qorv_bessel.h"
-
 namespace {
 
 const double CQORV_IRF_PI = std::acos(-1.0);
+/// Kaiser beta of the focuser's range and azimuth weighting.
+constexpr double CQORV_IRF_KAISER_BETA = 2.12;
+
+// The analyser's window is its own code, independent of the focuser's I0 and Kaiser, so that an
+// error in the focuser's window cannot cancel out of the comparison with the ideal response.
+
+/// I0 by its power series, the sum of (x/2)^(2k) / (k!)^2, in long double.
+double seriesI0(double x)
+{
+    const long double q = static_cast<long double>(x) * x / 4.0L;
+    long double aSum = 1.0L, aTerm = 1.0L;
+    for (int k = 1; k < 5000 && aTerm > aSum * 1e-22L; ++k) {
+        aTerm *= q / (static_cast<long double>(k) * k);
+        aSum += aTerm;
+    }
+    return static_cast<double>(aSum);
+}
+
+/// Kaiser weight at x in [-1, 1]: I0(beta sqrt(1 - x^2)) / I0(beta), given I0(beta).
+double kaiserAt(double x, double theBeta, double theI0Beta)
+{
+    const double r = 1.0 - x * x;
+    return seriesI0(theBeta * std::sqrt(r > 0.0 ? r : 0.0)) / theI0Beta;
+}
 
 /// sin(pi x) / (pi x).
 double normalisedSinc(double x)
@@ -47,14 +69,14 @@ std::vector<fcomplex> fqorvIrfKaiserBand(int n, double theRate, double theWidth,
                                          const std::function<double(double)>& theShape)
 {
     std::vector<fcomplex> aSpectrum(n);
-    const double aI0 = besselI0(theBeta);
+    const double aI0Beta = seriesI0(theBeta);
     for (int k = 0; k < n; ++k) {
         // Frequency of bin k taken within half the rate of the centre.
         double f = k * theRate / n;
         f -= theRate * std::floor((f - theCentre) / theRate + 0.5);
         const double x = 2.0 * (f - theCentre) / theWidth;
         if (std::fabs(x) > 1.0) continue;
-        double w = besselI0(theBeta * std::sqrt(1.0 - x * x)) / aI0;
+        double w = kaiserAt(x, theBeta, aI0Beta);
         if (theShape) w *= theShape(f - theCentre);
         aSpectrum[k] = fcomplex(static_cast<float>(w), 0.0f);
     }
@@ -64,7 +86,7 @@ std::vector<fcomplex> fqorvIrfKaiserBand(int n, double theRate, double theWidth,
 CIrfCut fqorvIrfIdealRangeBand(double theBandwidth, double theSamplingRate, int theUpsample, double theSidelobeWidths)
 {
     const std::vector<fcomplex> aSpectrum = fqorvIrfKaiserBand(CQORV_IRF_IDEAL_BINS, theSamplingRate, theBandwidth, 0.0,
-                                                               CQORV_KAISER_BETA_WEIGHT);
+                                                               CQORV_IRF_KAISER_BETA);
     return fqorvIrfMeasureSpectrum(aSpectrum, 0.0, theUpsample, theSidelobeWidths);
 }
 
@@ -79,12 +101,13 @@ CIrfCut fqorvIrfIdealRangeChirp(double theBandwidth, double thePulseLength, doub
     const int n = std::max(powerOfTwoAbove(2 * M), CQORV_IRF_IDEAL_BINS);
     std::vector<fcomplex> aEcho(n);
     std::vector<fcomplex> aReplica(n);
-    const std::vector<double> aWeight = kaiserWindow(M, CQORV_KAISER_BETA_WEIGHT);
+    const double aI0Beta = seriesI0(CQORV_IRF_KAISER_BETA);
     for (int i = 0; i < M; ++i) {
         const double t = i / theSamplingRate;
         const double aPhase = 2.0 * CQORV_IRF_PI * (0.5 * k * t + aStart) * t;
         aEcho[i] = fcomplex(static_cast<float>(std::cos(aPhase)), static_cast<float>(std::sin(aPhase)));
-        aReplica[i] = aEcho[i] * static_cast<float>(aWeight[i]);
+        const double aWeight = M > 1 ? kaiserAt(2.0 * (i - (M - 1) / 2.0) / (M - 1), CQORV_IRF_KAISER_BETA, aI0Beta) : 1.0;
+        aReplica[i] = aEcho[i] * static_cast<float>(aWeight);
     }
     FftPlan1D aForward(n, FftDirection::Forward);
     aForward.execute(aEcho.data());
@@ -107,6 +130,6 @@ CIrfCut fqorvIrfIdealAzimuth(double thePrf, double theFraction, double theCentro
     }
     const int n = CQORV_IRF_IDEAL_BINS;
     const std::vector<fcomplex> aSpectrum = fqorvIrfKaiserBand(n, thePrf, theFraction * thePrf, theCentroid,
-                                                               CQORV_KAISER_BETA_WEIGHT, aPattern);
+                                                               CQORV_IRF_KAISER_BETA, aPattern);
     return fqorvIrfMeasureSpectrum(aSpectrum, theCentroid / thePrf * n, theUpsample, theSidelobeWidths);
 }
