@@ -48,6 +48,53 @@ TEST_F(Orbit, RowsAgreeWithTheSimulatorsKeplerOrbit)
     checkAgainstSimulator("alos", 2000);
 }
 
+/// Largest position error (m) of an orbit's rows against the exact orbit.
+double maxPositionError(const YDF_ORBIT& o, const CSimProductHeader& p)
+{
+    double e = 0.0;
+    for (int k = 0; k < o.mNrOfLines; k += 101) {
+        const CSimState s = p.mOrbit->state(p.mTimeline->pulseTime(0) + k * (o.ti[1] - o.ti[0]));
+        e = std::max({e, std::fabs(o.x[k] - s.mPos.x), std::fabs(o.y[k] - s.mPos.y), std::fabs(o.z[k] - s.mPos.z)});
+    }
+    return e;
+}
+
+TEST_F(Orbit, OtherInterpolatorsAndTwoRowsPerLine)
+{
+    // Five vectors around the scene: least squares of degree 4 (Neville needs more than five).
+    CSimProductHeader p("ers2", 1500, 1024);
+    CDescriptionHeader& h = *p.mHeader;
+    const int n = h["StateVectorData.nStateVectors"].getInteger();
+    const int aFirst = (n - 5) / 2;
+    CQorvDate d = fqorvParseDateField(h["StateVectorData.TimeFirst"].getString(), "TimeFirst");
+    d.set(d.dayNumber(), d.secondsOfDay() + aFirst * h["StateVectorData.TimeDelta"].getDouble());
+    h["StateVectorData.TimeFirst"].setValue(d.text());
+    for (const char* aKey : {"StateVectorData.pos_x", "StateVectorData.pos_y", "StateVectorData.pos_z"}) {
+        std::vector<double> v(5);
+        for (int i = 0; i < 5; ++i) v[i] = h[aKey].getDouble(aFirst + i);
+        h[aKey].resize(1, 5);
+        for (int i = 0; i < 5; ++i) h[aKey].setValue(i, v[i]);
+    }
+    h["StateVectorData.nStateVectors"].setValue(5);
+    YDF_ORBIT o;
+    o.orbit(nullptr, 0.0f, false, &h, 0, 1);
+    EXPECT_TRUE(o.mPolynomial && !o.mNewMethod);
+    EXPECT_LT(maxPositionError(o, p), 0.01);
+    // SIR-C always takes the tension spline.
+    h["Sensor.SensorName"].setValue("SIR-C");
+    YDF_ORBIT aSpline;
+    aSpline.orbit(nullptr, 0.0f, false, &h, 0, 1);
+    EXPECT_FALSE(aSpline.mPolynomial);
+    EXPECT_LT(maxPositionError(aSpline, p), 2.0);  // the coarser interpolator: about 0.5 m here
+    // Two rows per line: twice the rows at half the line time, velocities still per whole line.
+    h["Sensor.SensorName"].setValue("ERS-2");
+    YDF_ORBIT o2;
+    o2.orbit(nullptr, 0.0f, false, &h, 0, 2);
+    EXPECT_EQ(o2.mNrOfLines, 2 * o.mNrOfLines);
+    EXPECT_NEAR(o2.x[2 * 600], o.x[600], 1.0);
+    EXPECT_NEAR(o2.vx[2 * 600], 0.5 * o.vx[600], 1e-3);
+}
+
 TEST_F(Orbit, SceneCentreAndHeadingAreWrittenWhenMissing)
 {
     CSimProductHeader p("ers2", 1500, 1024);
