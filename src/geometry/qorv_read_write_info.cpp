@@ -384,7 +384,7 @@ void readCalibration(const CDescriptionHeader& h, YDF_SAR& s)
         s.kpro = 1.0;
         if (getInteger(h, "ChannelInfo.CSK_CalibrationConstantCompensationFlag", -1) == 0 &&
             setField(h, "ChannelInfo.CalConstProc") && !settingOn("QORVEX_DISABLE_CALIBRATION"))
-            s.kpro = 1.0 / std::sqrt(h["ChannelInfo.CalConstProc"].getDouble());
+            s.kpro = 1.0 / std::sqrt(std::pow(10.0, h["ChannelInfo.CalConstProc"].getDouble() / 10.0));  // dB to linear
         if (setField(h, "ChannelInfo.CSK_RescalingFactor")) s.kpro /= h["ChannelInfo.CSK_RescalingFactor"].getDouble();
         const char* aInc = getText(h, "ChannelInfo.CSK_IncidenceAngleCompensationGeometry");
         const double aRefInc = getDouble(h, "ChannelInfo.CSK_ReferenceIncidenceAngle", 0.0);
@@ -507,6 +507,7 @@ double YDF_SAR::getDopplerFromSlantRangeDist(double theSlantRange, double theLin
         fdfTrace("getDopplerFromSlantRangeDist this->getSensorId() = %d\nCSAR_SENSOR_JERS1_ID = %d\n", getSensorId(),
                  CSAR_SENSOR_JERS1_ID);
     }
+    if (!mUseDopplerFlag) return 0.0;  // Doppler use switched off, or no usable model
     const double dR = theSlantRange - mNearSlantRange;
     if (thePerPixel && !mRangeDopplerFref.empty()) {
         const int n = static_cast<int>(mRangeDopplerFref.size());

@@ -18,7 +18,8 @@ struct YDF_SAR {
 
     /// Doppler centroid (Hz) at slant range theSlantRange (m) and image line theLine. Precedence:
     /// the per-pixel array (thePerPixel), the Doppler table (theUseTable, rows blended by line
-    /// time, polynomial in slant range in metres), the sensor's polynomial.
+    /// time, polynomial in slant range in metres), the sensor's polynomial. 0 when
+    /// mUseDopplerFlag is false.
     double getDopplerFromSlantRangeDist(double theSlantRange, double theLine, bool theUseTable, bool thePerPixel);
     /// The same at a pixel: slant range = near range + thePixel * range pixel spacing.
     double getDopplerFromPixel(double thePixel, double theLine, bool theUseTable, bool thePerPixel);

@@ -9,6 +9,7 @@
 
 #include "geometry_test_util.h"
 #include "qorv_date.h"
+#include "qorv_enviroment.h"
 #include "qorv_errors.h"
 #include "qorv_read_write_info.h"
 #include "qorvex_test_support.h"
@@ -68,6 +69,16 @@ TEST_F(ImageInfo, ImportedPolynomialFollowsTheSensorsRule)
             EXPECT_NEAR(s.getDopplerFromSlantRangeDist(r, 0.0, false, false), e, 1e-6 * std::fabs(e) + 1e-9);
         }
     }
+    // The setting that switches Doppler use off.
+    CSimProductHeader p("ers2", 1200, 1024);
+    (*p.mHeader)["Processing.DopCenRangeCoeff"].resize(1, 1);
+    (*p.mHeader)["Processing.DopCenRangeCoeff"].setValue(0, 0, 250.0);
+    fdfSetEnvVar("YES", "QORVEX_DISABLE_DOPPLER");
+    YDF_SAR s;
+    read_image_info(*p.mHeader, s);
+    EXPECT_FALSE(s.mUseDopplerFlag);
+    EXPECT_EQ(s.getDopplerFromPixel(10.0, 10.0, true, true), 0.0);
+    fdfSetEnvVar("NO", "QORVEX_DISABLE_DOPPLER");
 }
 
 TEST_F(ImageInfo, EstimatorTableIsBlendedByLineTimeForEverySensor)
