@@ -71,6 +71,7 @@ void resetRecord(YDF_SAR& s)
     s.mBetaNoughtNbr = 0;
     s.mDopplerTable.clear();
     s.mDopplerTableFlag = false;
+    s.mDopplerTableEstimated = false;
     s.mDopplerTableRows = s.mDopplerTableCols = 0;
     s.mDopplerTableTimeSpan = s.mDopplerTableImageOffset = 0.0;
     s.mDopplerCoeff.fill(0.0);
@@ -274,8 +275,9 @@ void readDopplerModel(const CDescriptionHeader& h, YDF_SAR& s)
     }
     const int id = s.mSensorId, p = s.mOriginProductTypeId;
     if (aCoeff != nullptr && aFlag != nullptr && std::strcmp(aFlag, "OK") == 0) {
-        // The estimator's table, for every sensor.
+        // The estimator's table, for every sensor; the steps evaluate it whatever table flag they pass.
         loadDopplerTable(*aCoeff, s, 1, aUserPtr);
+        s.mDopplerTableEstimated = s.mDopplerTableFlag;
     } else {
         // As imported: one row of coefficients, lowest first.
         if (aCoeff != nullptr && aCoeff->getNbrOfRows() == 1) {
@@ -514,7 +516,7 @@ double YDF_SAR::getDopplerFromSlantRangeDist(double theSlantRange, double theLin
         const int i = std::clamp(static_cast<int>(dR / mRangePixelSpacing), 0, n - 1);
         return mRangeDopplerFref[i] * mRangeDopplerFrefScale;
     }
-    if (theUseTable && mDopplerTableFlag && mDopplerTableRows > 0) {
+    if ((theUseTable || mDopplerTableEstimated) && mDopplerTableFlag && mDopplerTableRows > 0) {
         // Row position in table time; the polynomials of the two neighbouring rows are blended.
         const double t = theLine * mNumberOfAzimuthLooks / prf + mDopplerTableImageOffset;
         const double aPos = mDopplerTableTimeSpan > 0.0 ? std::max(t / mDopplerTableTimeSpan, 0.0) : 0.0;

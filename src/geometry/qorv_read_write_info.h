@@ -17,9 +17,9 @@ struct YDF_SAR {
     int getSensorId() const { return mSensorId; }
 
     /// Doppler centroid (Hz) at slant range theSlantRange (m) and image line theLine. Precedence:
-    /// the per-pixel array (thePerPixel), the Doppler table (theUseTable, rows blended by line
-    /// time, polynomial in slant range in metres), the sensor's polynomial. 0 when
-    /// mUseDopplerFlag is false.
+    /// the per-pixel array (thePerPixel), the Doppler table (rows blended by line time, polynomial
+    /// in slant range in metres; the estimator's table always, a product's own table with
+    /// theUseTable), the sensor's polynomial. 0 when mUseDopplerFlag is false.
     double getDopplerFromSlantRangeDist(double theSlantRange, double theLine, bool theUseTable, bool thePerPixel);
     /// The same at a pixel: slant range = near range + thePixel * range pixel spacing.
     double getDopplerFromPixel(double thePixel, double theLine, bool theUseTable, bool thePerPixel);
@@ -70,6 +70,7 @@ struct YDF_SAR {
     bool mUseDopplerFlag = true;
     std::array<double, 16> mDopplerCoeff{};
     bool mDopplerTableFlag = false;
+    bool mDopplerTableEstimated = false;  // the table is the Doppler estimator's: used whatever the table flag of a call
     int mDopplerTableRows = 0, mDopplerTableCols = 0;
     std::vector<std::vector<double>> mDopplerTable;  // day, seconds of day, coefficients lowest first
     std::vector<double> mBetaNoughtCoeff;
