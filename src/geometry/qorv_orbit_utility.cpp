@@ -119,6 +119,7 @@ void YDF_ORBIT::orbit(const char* aParamFile, float aAzimuthPixelsShift, bool aU
     fdfTrace("\nMake orbit with azimuth pixels shift = %f\n", aShift);
     mAzimuthShift = aShift;
     mPadLines = aPadLines;
+    mWindow = 0;
     mLineFactor = aLineFactor > 0 ? aLineFactor : 1;
     mInvLineFactor = 1.0 / mLineFactor;
 
