@@ -49,7 +49,7 @@ void sampleWindow(CRasterFile& theFile, const CSampleWindow& w, bool theRoot, CI
             const int aNew = thePercentFrom + static_cast<int>(static_cast<long long>(thePercentTo - thePercentFrom) *
                                                                (r - w.mRowStart) / std::max(1, w.mRowEnd - w.mRowStart));
             if (aNew != aPercent) {
-                if (!getAndSetPerc(aPercent, aNew, nullptr)) {}
+                getAndSetPerc(aPercent, aNew, nullptr);
                 aPercent = aNew;
             }
         }
