@@ -7,6 +7,7 @@
 #include "qorv_errors.h"
 #include "qorv_generic_utility.h"
 #include "qorv_proc_param.h"
+#include "qorv_raster_to_geotiff.h"
 
 namespace {
 
@@ -64,6 +65,6 @@ const CStepRow CQORV_STEP_TABLE[CQORV_STEP_NBR] = {
     {"doppler ambiguity", stepNotBuilt, shutDopplerAmbiguity},
     {"SAR azimuth omega/k processor", stepNotBuilt, shutFocusing},
     {"multi look", stepNotBuilt, fdfDefaultShut},
-    {"multi look to tiff conversion", stepNotBuilt, fdfDefaultShut},
-    {"slc to tiff conversion", stepNotBuilt, fdfDefaultShut},
+    {"multi look to tiff conversion", qorv_raster_to_geotiff, fdfDefaultShut},
+    {"slc to tiff conversion", qorv_raster_to_geotiff, fdfDefaultShut},
 };

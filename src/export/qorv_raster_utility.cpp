@@ -1,0 +1,260 @@
+#include "qorv_raster_utility.h"
+
+#include <cmath>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "qorv_description_section.h"
+#include "qorv_enviroment.h"
+#include "qorv_errors.h"
+#include "qorv_generic_utility.h"
+#include "qorv_identifiers.h"
+#include "qorv_progress.h"
+#include "qorv_raster_file.h"
+#include "tools_raster_file_exp.h"
+
+namespace {
+
+constexpr double CQORV_NO_THRESHOLD = -999999.0;
+
+std::unique_ptr<CDescriptionHeader> readHeaderOrFail(const char* theName)
+{
+    auto aHeader = CDescriptionHeader::makeFull();
+    if (theName == nullptr || !aHeader->read(theName, false)) {
+        fdfTrace("Error: missing parameter file %s\n", theName ? theName : "");
+        QORV_FATAL(CQORV_ERR_MISSING_FILE,
+                   fqorvStringFormat("Error: missing parameter file %s", theName ? theName : "").c_str());
+    }
+    return aHeader;
+}
+
+/// Adds the non-null values of rows/columns of a window to theStats; progress over the rows.
+void sampleWindow(CRasterFile& theFile, const CSampleWindow& w, bool theRoot, CImageStats& theStats,
+                  int thePercentFrom, int thePercentTo)
+{
+    const bool aComplex = fqorvCellTypeIsComplex(theFile.getCellType());
+    const double aNull = theFile.getDummyVal();
+    if (w.mColEnd <= w.mColStart) return;
+    std::vector<dcomplex> aLine(static_cast<std::size_t>(w.mColEnd - w.mColStart));
+    int aPercent = thePercentFrom;
+    for (int r = w.mRowStart; r < w.mRowEnd; r += w.mInc) {
+        fqorvReadLine(theFile, aLine.data(), r, w.mColStart, w.mColEnd - 1);
+        for (int c = 0; c < w.mColEnd - w.mColStart; c += w.mInc) {
+            const double re = aLine[c].real(), im = aLine[c].imag();
+            if (fqorvIsNullCell(re, im, aComplex, aNull)) continue;
+            theStats.add(aComplex ? std::sqrt(re * re + im * im) : re, theRoot);
+        }
+        if (thePercentFrom >= 0) {
+            const int aNew = thePercentFrom + static_cast<int>(static_cast<long long>(thePercentTo - thePercentFrom) *
+                                                               (r - w.mRowStart) / std::max(1, w.mRowEnd - w.mRowStart));
+            if (aNew != aPercent) {
+                getAndSetPerc(aPercent, aNew, nullptr);
+                aPercent = aNew;
+            }
+        }
+    }
+}
+
+void traceWindow(const char* theFirst, const CSampleWindow& w)
+{
+    fdfTrace("%s%d\naSampleRowEnd = %d\naSampleColStart = %d\naSampleColEnd = %d\naSampleInc = %d\n", theFirst,
+             w.mRowStart, w.mRowEnd, w.mColStart, w.mColEnd, w.mInc);
+}
+
+/// Sets a user key to a "%lf" text.
+void setNumberKey(CDescriptionHeader& theHeader, const char* theKey, double theValue)
+{
+    fqorvSetUserKey(theHeader, theKey, fqorvStringFormat("%lf", theValue).c_str());
+}
+
+/// Calibration constant after the amplitudes were multiplied by theFactor: a value in decibels
+/// (below -80.0) gains 20 log10(factor), a linear one is multiplied by factor^2.
+double scaledCalibration(double theValue, double theFactor)
+{
+    if (theValue < -80.0) return theValue + 20.0 * std::log10(theFactor);
+    return theValue * theFactor * theFactor;
+}
+
+}  // namespace
+
+CImageStats fqorvImageStatistics(CRasterFile& theFile, bool theRootOfValue, int thePercentFrom, int thePercentTo)
+{
+    CImageStats aStats;
+    const int aLines = theFile.getNrOfLines(), aPixels = theFile.getNrOfPixels();
+    const CSampleWindow aWindow = fqorvCentralSampleWindow(aLines, aPixels);
+    traceWindow("\naSampleRowStart = ", aWindow);
+    sampleWindow(theFile, aWindow, theRootOfValue, aStats, thePercentFrom, thePercentTo);
+    if (aStats.mCount == 0) {
+        const CSampleWindow aAll{0, aLines, 0, aPixels, 1};
+        traceWindow("\n\naSampleRowStart = ", aAll);
+        sampleWindow(theFile, aAll, theRootOfValue, aStats, thePercentFrom, thePercentTo);
+    }
+    if (!aStats.finish()) {
+        fdfTrace("Error: 0 non null points in the input file \n");
+        QORV_FATAL(CQORV_ERR_NO_NON_NULL_POINTS,
+                   fqorvStringFormat("Error: 0 non null points in the input file :%s", theFile.getFileName().c_str())
+                       .c_str());
+    }
+    fdfTrace("\n\n  NBR = %lld\naSumOfVal      : %lf\naScaleSum: %lf\naMean    : %lf\nSTDV     : %lf\nNull Value: %lf\n",
+             aStats.mCount, aStats.mSum.mSum, aStats.mSum.mDivisor, aStats.mMean, aStats.mStd, theFile.getDummyVal());
+    return aStats;
+}
+
+void fqorvNormalizeRaster(const char* theRaster, const char* theHeader, double aNormalizeValue, double theNbrOfStd,
+                          bool theFlag, void* thePointer, double theLast)
+{
+    auto aHeader = readHeaderOrFail(theHeader);
+    const int aLines = (*aHeader)["RasterInfo.NrOfLinesPerImage"].getInteger();
+    const int aPixels = (*aHeader)["RasterInfo.NrOfPixelsPerLine"].getInteger();
+    std::string aConstStr;
+    if (fqorvGetUserKey(*aHeader, "ORIGIN DATA", aConstStr)) {
+        fdfTrace("aConstStr = %s\n", aConstStr.c_str());
+        fdfTrace("fqorvOrigProdStrToID(aConstStr) = %d\n", fqorvOrigProdStrToID(aConstStr.c_str()));
+    }
+    const double aNormalizeMeanvalue = std::sqrt(aNormalizeValue);
+
+    // Sample: amplitudes over the central window, the whole image when it holds none.
+    CRasterFileParam aParam;
+    fqorvRasterParamFromHeader(*aHeader, theRaster, aParam);
+    CRasterFile aFile;
+    aFile.openRead(aParam);
+    if (!fqorvCellTypeIsComplex(aFile.getCellType())) {
+        fdfTrace("Cell Type Unknow mCellType = %d\n", aFile.getCellType());
+        QORV_FATAL(CQORV_ERR_RASTER_ACCESS,
+                   fqorvStringFormat("Cell Type Unknow mCellType = %d", aFile.getCellType()).c_str());
+    }
+    CImageStats aStats;
+    const CSampleWindow aWindow = fqorvCentralSampleWindow(aLines, aPixels);
+    traceWindow("\naSampleRowStart = ", aWindow);
+    sampleWindow(aFile, aWindow, false, aStats, -1, -1);
+    fdfTrace("Number of points in mean : %lld\n", aStats.mCount);
+    if (aStats.mCount == 0) sampleWindow(aFile, CSampleWindow{0, aLines, 0, aPixels, 1}, false, aStats, -1, -1);
+    aFile.close();
+    double aMean = 1.0, aStd = 0.0;
+    if (aStats.finish()) {
+        aMean = aStats.mMean;
+        aStd = aStats.mStd;
+    }
+    const double aNormFactor = aNormalizeMeanvalue / (aMean + aStd * theNbrOfStd);
+    fdfTrace("aMean = %lf\naStd = %lf\naNormFactor = %lf\n", aMean, aStd, aNormFactor);
+
+    // In place, line by line; null cells keep their value.
+    if (aStats.mCount > 0) {
+        aFile.openWrite(CQORV_RF_OPEN_READ_WRITE, aParam);
+        const double aNull = aFile.getDummyVal();
+        std::vector<fcomplex> aLine(static_cast<std::size_t>(aPixels));
+        int aPercent = 50;
+        getAndSetPerc(-1, aPercent, nullptr);
+        for (int r = 0; r < aLines; ++r) {
+            fqorvReadLine(aFile, aLine.data(), r);
+            for (fcomplex& z : aLine)
+                if (!fqorvIsNullCell(z.real(), z.imag(), true, aNull))
+                    z = fcomplex(static_cast<float>(z.real() * aNormFactor), static_cast<float>(z.imag() * aNormFactor));
+            fqorvWriteLine(aFile, aLine.data(), r);
+            const int aNew = 50 + static_cast<int>(49LL * r / aLines);
+            if (aNew != aPercent) {
+                getAndSetPerc(aPercent, aNew, nullptr);
+                aPercent = aNew;
+            }
+        }
+        aFile.close();
+    }
+
+    setNumberKey(*aHeader, "NORMALIZATION FACTOR", aNormFactor);
+    setNumberKey(*aHeader, "NORMALIZATION MEAN", aMean);
+    CDescriptionField* aCal = aHeader->findField("ChannelInfo.CalConstProc");
+    if (aCal != nullptr && aCal->isInitialised()) {
+        if (aCal->mStructure == CQORV_DS_VECTOR) {
+            for (int k = 0; k < aCal->getNbrOfElements(); ++k)
+                if (aCal->isSet(0, k)) aCal->setValue(k, scaledCalibration(aCal->getDouble(k), aNormFactor));
+        } else {
+            aCal->setValue(scaledCalibration(aCal->getDouble(), aNormFactor));
+        }
+    }
+    const std::string aOutHeader = std::string(theRaster) + "_hdr";
+    if (!aHeader->write(aOutHeader.c_str(), false, false))
+        QORV_FATAL(CQORV_ERR_CREATE_FILE, aOutHeader.c_str());
+    if (theFlag && thePointer != nullptr) *static_cast<double*>(thePointer) = aNormFactor;
+    (void)theLast;
+}
+
+int fqorvCutDummyValues(const char* theIn, const char* theOut, int aCutPixelsSize, double aMinValueAdmit)
+{
+    auto aHeader = readHeaderOrFail(theIn);
+    CRasterFileParam aParam;
+    fqorvRasterParamFromHeader(*aHeader, theIn, aParam);
+    CRasterFile aFile;
+    aFile.openRead(aParam);
+    const int aLines = aFile.getNrOfLines(), aPixels = aFile.getNrOfPixels();
+    const bool aComplex = fqorvCellTypeIsComplex(aFile.getCellType());
+    const bool aThreshold = aMinValueAdmit != CQORV_NO_THRESHOLD;
+    const double aNull = aFile.getDummyVal();
+
+    // The rectangle of data, in rows and columns of the time directions (as the copy reads them).
+    int aRow0 = aLines, aRow1 = -1, aCol0 = aPixels, aCol1 = -1;
+    std::vector<dcomplex> aLine(static_cast<std::size_t>(aPixels));
+    for (int r = 0; r < aLines; ++r) {
+        fqorvReadLine(aFile, aLine.data(), r);
+        for (int c = 0; c < aPixels; ++c) {
+            const double re = aLine[c].real(), im = aLine[c].imag();
+            if (fqorvIsNullCell(re, im, aComplex, aNull)) continue;
+            if (aThreshold && (aComplex ? re * re + im * im : re) <= aMinValueAdmit) continue;
+            aRow0 = std::min(aRow0, r);
+            aRow1 = r;
+            aCol0 = std::min(aCol0, c);
+            aCol1 = std::max(aCol1, c);
+        }
+    }
+    if (aRow1 < 0) {
+        aFile.close();
+        fdfTrace("CUT IMAGE %s  no data\n", theIn);
+        return 0;
+    }
+    const int m = std::max(0, aCutPixelsSize);
+    aRow0 = std::max(0, aRow0 - m);
+    aRow1 = std::min(aLines - 1, aRow1 + m);
+    aCol0 = std::max(0, aCol0 - m);
+    aCol1 = std::min(aPixels - 1, aCol1 + m);
+    fdfTrace("CUT IMAGE %s  R[%d,%d]  C[%d,%d]\n", theIn, aRow0, aRow1, aCol0, aCol1);
+    if (aRow0 == 0 && aCol0 == 0 && aRow1 == aLines - 1 && aCol1 == aPixels - 1) {
+        aFile.close();
+        return 0;
+    }
+
+    // Copy in the buffer's row and column order, so that time directions carry over unchanged.
+    auto aOutHeader = CDescriptionHeader::makeFull();
+    aOutHeader->copyFrom(*aHeader, true);
+    (*aOutHeader)["RasterInfo.NrOfPixelsPerLine"].setValue(aCol1 - aCol0 + 1);
+    (*aOutHeader)["RasterInfo.NrOfLinesPerImage"].setValue(aRow1 - aRow0 + 1);
+    (*aOutHeader)["RasterInfo.HeaderOffset"].setValue(0);
+    (*aOutHeader)["RasterInfo.RowPrefix"].setValue(0);
+    (*aOutHeader)["RasterInfo.RowSuffix"].setValue(0);
+    (*aOutHeader)["RasterInfo.FooterLen"].setValue(0);
+    (*aOutHeader)["RasterInfo.BytesOrder"].setValue(fqorvMachineIsMSBF() ? "MSBF" : "LSBF");
+    (*aOutHeader)["RasterInfo.CellType"].setValue(fqorvCellTypeName(aFile.getCellType()));
+    if (aFile.getDataUnits() >= 0) (*aOutHeader)["RasterInfo.DataUnits"].setValue(fqorvDataUnitsName(aFile.getDataUnits()));
+    (*aOutHeader)["RasterInfo.NullCellValue"].setValue(aNull);
+    CRasterFileParam aOutParam;
+    fqorvRasterParamFromHeader(*aOutHeader, theOut, aOutParam);
+    aOutParam.mRealScaleFactor = aOutParam.mImaginaryScaleFactor = 1.0;
+    CRasterFile aOut;
+    aOut.openWrite(CQORV_RF_OPEN_WRITE, aOutParam);
+    // A complex buffer written into a real cell would be detected: real cells go through doubles.
+    std::vector<dcomplex> aPart(static_cast<std::size_t>(aCol1 - aCol0 + 1));
+    std::vector<double> aReal(aPart.size());
+    for (int r = aRow0; r <= aRow1; ++r) {
+        if (aComplex) {
+            fqorvReadLine(aFile, aPart.data(), r, aCol0, aCol1);
+            fqorvWriteLine(aOut, aPart.data(), r - aRow0);
+        } else {
+            fqorvReadLine(aFile, aReal.data(), r, aCol0, aCol1);
+            fqorvWriteLine(aOut, aReal.data(), r - aRow0);
+        }
+    }
+    aOut.close();
+    aFile.close();
+    if (!aOutHeader->write((std::string(theOut) + "_hdr").c_str(), false, false))
+        QORV_FATAL(CQORV_ERR_CREATE_FILE, theOut);
+    return 1;
+}
