@@ -12,3 +12,15 @@ bool fqorvSuggestedLooks(double thePixelSpacingRg, double thePixelSpacingAz, dou
                          double theAzimuthAngleDeg, int& theRangeLooks, int& theAzimuthLooks,
                          double& theRangeGroundSpacing, double& theAzimuthGroundSpacing);
 
+/// The suggested looks rule on a header file: "<name>_hdr", else "<name>_slc_hdr", else
+/// "<name>_slc". The range angle is 23 degrees unless ChannelInfo.RadarsatLookAngle,
+/// RangeLookAngle or IncidenceAngle hold one (the last of them wins); the azimuth angle is 90.
+/// Answers 1 with looks and ground spacings (m), -1 when no header loads or the rule can't apply.
+int fqorvSuggestedLooksFromFile(const char* theName, int& theRangeLooks, int& theAzimuthLooks,
+                                double& theRangeGroundSpacing, double& theAzimuthGroundSpacing);
+
+/// Step 6 "multi look". argv: title, SLC image, MLI image, processing parameter file (not
+/// opened), range looks, azimuth looks (below 1: the suggested looks), gate value, "OK" when a cut
+/// file replaces the MLI by renaming, cut border size ("NotOK": -1), cut minimum value ("NotOK":
+/// no threshold). Writes "<MLI>" and its header; returns 0, failures end the process.
+int qorv_multi_SLC(int argc, char** argv);
