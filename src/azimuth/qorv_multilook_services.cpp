@@ -1,5 +1,6 @@
-// Links of the multi-look step to the orbit and export libraries. While a library is not part of
-// the build, its service refuses the request by name rather than pass wrong data on.
+// Links of the multi-look step to the orbit and export libraries, and its file services. While a
+// library is not part of the build, its service refuses the request by name rather than pass
+// wrong data on.
 #include "qorv_multilook_services.h"
 
 #include <filesystem>
@@ -7,11 +8,11 @@
 
 #include "qorv_enviroment.h"
 #include "qorv_errors.h"
+#include "qorv_orbit_utility.h"
 
-void fqorvMultiLookConvertStateVectors(CDescriptionHeader&)
+void fqorvMultiLookConvertStateVectors(CDescriptionHeader& theStore)
 {
-    fdfTrace("\nError: state vectors in IRS and no frame conversion in this build\n");
-    QORV_FATAL(CQORV_ERR_WRONG_REQUEST, "IRS state vectors: no frame conversion");
+    fqorvConvertStateVectorsToEcr(theStore);
 }
 
 int fqorvMultiLookCutDummyValues(const char*, const char*, int, double)

@@ -208,6 +208,19 @@ TEST(MultiLookStep, MeansHeaderAndUserKeysOfAnSlc)
     const std::string aSlc = aEnv.workPath("scene_slc").string();
     const std::string aMli = aEnv.workPath("scene_pwr").string();
     writeSlc(aSlc, 7, 10);
+    {  // inertial state vectors, which the step turns to the Earth-fixed frame
+        auto h = readHeader(aSlc);
+        (*h)["nStateVectors"].setValue(2);
+        (*h)["TimeFirst"].setValue("21-MAR-1996 10:15:00.000000");
+        (*h)["TimeDelta"].setValue(60.0);
+        for (const char* aKey : {"pos_x", "pos_y", "pos_z"}) (*h)[aKey].resize(1, 2);
+        for (int i = 0; i < 2; ++i) (*h)["pos_x"].setValue(i, 7.0e6), (*h)["pos_y"].setValue(i, 1.0e6 * i), (*h)["pos_z"].setValue(i, 1.0e5);
+        (*h)["ChannelInfo.PRF"].resize(1, 1);
+        (*h)["ChannelInfo.PRF"].setValue(0, 1680.0);
+        (*h)["MeanAltitude"].setValue(780000.0);
+        (*h)["StateVectorReference"].setValue("IRS");
+        ASSERT_TRUE(h->write((aSlc + ".sml").c_str(), true, false));
+    }
     // Looks as text of real numbers; line 6 and column 9 lie beyond the last full rectangle.
     ASSERT_EQ(runStep(qorv_multi_SLC, {"multi look", aSlc, aMli, "NotOK", "3.000000", "2", "0", "NotOK", "NotOK", "NotOK"}), 0);
     EXPECT_FALSE(fs::exists(aMli + "_tmp"));
@@ -234,6 +247,10 @@ TEST(MultiLookStep, MeansHeaderAndUserKeysOfAnSlc)
     EXPECT_EQ(userKey(aOut, "LOOKS AZIMUTH NUMBER"), "2");
     EXPECT_EQ(userKey(aOut, "SCENE DATA"), "ERS-2 ers_slc");
     EXPECT_EQ(userKey(aOut, "ACQUISITION TIME"), "21-MAR-1996 10:15:42.123456");
+    EXPECT_STREQ(aOut["StateVectorReference"].getString(), "ECR");
+    EXPECT_NE(aOut["pos_x"].getDouble(1), 7.0e6);  // rotated about z: the distance from the axis stays
+    EXPECT_NEAR(std::hypot(aOut["pos_x"].getDouble(1), aOut["pos_y"].getDouble(1)), std::hypot(7.0e6, 1.0e6), 1e-6);
+    EXPECT_EQ(aOut["pos_z"].getDouble(1), 1.0e5);
     EXPECT_NE(aEnv.trace().find("*** VDQ SAR SLC --> MULTILOOK INTENSITY IMAGE v2.4 29-oct-99 xq ***"), std::string::npos);
 
     // Zero looks take the header's suggestion; a second multi-look multiplies the look counts.
