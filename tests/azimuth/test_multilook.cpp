@@ -35,13 +35,15 @@ double rampMean(int c0, int n, int l0, int m)
     return aCols / n + aLines / m;
 }
 
-/// Writes a FLOAT_COMPLEX SLC "<theName>" of theLines x theWidth ramp samples and its header.
-void writeSlc(const std::string& theName, int theLines, int theWidth, const char* theCellType = "FLOAT_COMPLEX")
+/// Writes an SLC "<theName>" of theLines x theWidth ramp samples (image lines) and its header.
+void writeSlc(const std::string& theName, int theLines, int theWidth, const char* theCellType = "FLOAT_COMPLEX",
+              const char* theLinesDirection = "INCREASE TIME DIRECTION")
 {
     auto h = CDescriptionHeader::makeFull();
     CDescriptionHeader& aHeader = *h;
     for (auto [aKey, aText] : {std::pair{"SensorName", "ERS-2"}, {"AzimuthStartTime", "21-MAR-1996 10:15:42.123456"},
-                               {"CellType", theCellType}, {"DataUnits", "SLC"}, {"BytesOrder", "LSBF"}})
+                               {"CellType", theCellType}, {"DataUnits", "SLC"}, {"BytesOrder", "LSBF"},
+                               {"TimeDirectionLines", theLinesDirection}})
         aHeader[aKey].setValue(aText);
     for (auto [aKey, aValue] : {std::pair{"NrOfPixelsPerLine", theWidth}, {"NrOfLinesPerImage", theLines}, {"HeaderOffset", 0},
                                 {"RowPrefix", 0}, {"RowSuffix", 0}, {"NAzimuthLooks", 1}, {"NRangeLooks", 1}})
@@ -253,6 +255,18 @@ TEST(MultiLookStep, MeansHeaderAndUserKeysOfAnSlc)
     EXPECT_EQ(rl, 1);
     EXPECT_EQ(al, 7);
     EXPECT_EQ(fqorvSuggestedLooksFromFile(aEnv.workPath("nothing").c_str(), rl, al, gr, ga), -1);
+}
+
+TEST(MultiLookStep, LinesInDecreasingTimeKeepTheFileOrderOfTheSlc)
+{
+    qtest::InProcessEnvironment aEnv;
+    const std::string aSlc = aEnv.workPath("down_slc").string();
+    const std::string aMli = aEnv.workPath("down_pwr").string();
+    writeSlc(aSlc, 7, 3, "FLOAT_COMPLEX", "DECREASE TIME DIRECTION");  // file line 0 is image line 6
+    ASSERT_EQ(runStep(qorv_multi_SLC, {"multi look", aSlc, aMli, "NotOK", "1", "2", "0", "NotOK", "NotOK", "NotOK"}), 0);
+    // Image line 6 is left over; file line 0 of the MLI is its last line, from image lines 4 and 5.
+    const std::vector<float> aData = readMli(aMli, *readHeader(aMli));
+    for (int y = 0; y < 3; ++y) EXPECT_NEAR(aData[3 * y], rampMean(0, 1, 4 - 2 * y, 2), 1e-4) << y;
 }
 
 TEST(MultiLookStep, BadInputFailsWithItsIdAndLeavesNoProduct)
