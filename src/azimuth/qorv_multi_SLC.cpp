@@ -328,3 +328,17 @@ int qorv_multi_SLC(int argc, char** argv)
     QORV_WARNING(0, "");
     return 0;
 }
+
+bool fqorvMultiLookImage(const char* theSlc, const char* theMli, double theAzimuthLooks, double theRangeLooks,
+                         bool theCutByRename, bool theGate16000, const char* theCutPixelsSize,
+                         const char* theMinValueAdmit)
+{
+    std::string aArgs[CQORV_ML_ARGUMENT_NBR] = {"FOCUSSING", theSlc, theMli, "NotOK",
+                                                fqorvStringFormat("%lf", theRangeLooks),
+                                                fqorvStringFormat("%lf", theAzimuthLooks),
+                                                theGate16000 ? "16000" : "NotOK", theCutByRename ? "OK" : "NotOK",
+                                                theCutPixelsSize, theMinValueAdmit};
+    char* aArgv[CQORV_ML_ARGUMENT_NBR];
+    for (int i = 0; i < CQORV_ML_ARGUMENT_NBR; ++i) aArgv[i] = aArgs[i].data();
+    return qorv_multi_SLC(CQORV_ML_ARGUMENT_NBR, aArgv) == 0;
+}

@@ -24,3 +24,10 @@ int fqorvSuggestedLooksFromFile(const char* theName, int& theRangeLooks, int& th
 /// file replaces the MLI by renaming, cut border size ("NotOK": -1), cut minimum value ("NotOK":
 /// no threshold). Writes "<MLI>" and its header; returns 0, failures end the process.
 int qorv_multi_SLC(int argc, char** argv);
+
+/// Step 6 for other code: looks as numbers (passed as "%lf" text, used by their integer part),
+/// theCutByRename for argument 7 ("OK"), theGate16000 for argument 6 ("16000", else "NotOK"),
+/// cut size and minimum value as text ("NotOK": none). True when the step returned 0.
+bool fqorvMultiLookImage(const char* theSlc, const char* theMli, double theAzimuthLooks, double theRangeLooks,
+                         bool theCutByRename, bool theGate16000, const char* theCutPixelsSize,
+                         const char* theMinValueAdmit);

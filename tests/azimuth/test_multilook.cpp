@@ -263,7 +263,7 @@ TEST(MultiLookStep, LinesInDecreasingTimeKeepTheFileOrderOfTheSlc)
     const std::string aSlc = aEnv.workPath("down_slc").string();
     const std::string aMli = aEnv.workPath("down_pwr").string();
     writeSlc(aSlc, 7, 3, "FLOAT_COMPLEX", "DECREASE TIME DIRECTION");  // file line 0 is image line 6
-    ASSERT_EQ(runStep(qorv_multi_SLC, {"multi look", aSlc, aMli, "NotOK", "1", "2", "0", "NotOK", "NotOK", "NotOK"}), 0);
+    ASSERT_TRUE(fqorvMultiLookImage(aSlc.c_str(), aMli.c_str(), 2.0, 1.0, false, false, "NotOK", "NotOK"));
     // Image line 6 is left over; file line 0 of the MLI is its last line, from image lines 4 and 5.
     const std::vector<float> aData = readMli(aMli, *readHeader(aMli));
     for (int y = 0; y < 3; ++y) EXPECT_NEAR(aData[3 * y], rampMean(0, 1, 4 - 2 * y, 2), 1e-4) << y;
