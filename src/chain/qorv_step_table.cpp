@@ -6,6 +6,7 @@
 #include "qorv_enviroment.h"
 #include "qorv_errors.h"
 #include "qorv_generic_utility.h"
+#include "qorv_multi_SLC.h"
 #include "qorv_proc_param.h"
 
 namespace {
@@ -63,7 +64,7 @@ const CStepRow CQORV_STEP_TABLE[CQORV_STEP_NBR] = {
     {"autofocus", stepNotBuilt, fdfDefaultShut},
     {"doppler ambiguity", stepNotBuilt, shutDopplerAmbiguity},
     {"SAR azimuth omega/k processor", stepNotBuilt, shutFocusing},
-    {"multi look", stepNotBuilt, fdfDefaultShut},
+    {"multi look", qorv_multi_SLC, fdfDefaultShut},
     {"multi look to tiff conversion", stepNotBuilt, fdfDefaultShut},
     {"slc to tiff conversion", stepNotBuilt, fdfDefaultShut},
 };
