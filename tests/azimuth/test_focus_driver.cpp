@@ -1,0 +1,155 @@
+// Step 5 through the driver (a real process): a simulated ERS scene whose range compressed product is
+// synthesised here from the scene's truth, focused by steps 0 and 5 and measured with qorvex_irf.
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <filesystem>
+#include <vector>
+
+#include "qorv_az_SLC.h"
+#include "qorv_description_section.h"
+#include "qorv_fft.h"
+#include "qorv_irf_ideal.h"
+#include "qorv_json.h"
+#include "qorv_raster_file.h"
+#include "qorvex_test_support.h"
+#include "tools_raster_file_exp.h"
+
+namespace {
+
+constexpr double c = 299792458.0;
+
+/// Writes "<root>_rc" and its header: the raw header with the range compressed raster's fields,
+/// and per target the Kaiser 2.12 band in range at R(t) with R(t)^2 = R0^2 + v^2 (t - t0)^2, the
+/// carrier exp(-j 4 pi R / lambda) and the two-way antenna pattern, within half the PRF of the centroid.
+void fWriteRangeCompressed(const std::filesystem::path& theRaw, const std::filesystem::path& theRc, const CJson& theTruth)
+{
+    auto aHeader = CDescriptionHeader::makeFull();
+    ASSERT_TRUE(aHeader->read((theRaw.string() + "_hdr").c_str(), true));
+    const CJson& radar = theTruth["radar"];
+    const double fs = radar["sampling_rate"].number(), prf = radar["prf"].number(), lambda = radar["wavelength"].number();
+    const double aRNear = theTruth["window"]["r_near"].number();
+    const double v = theTruth["velocity"]["true_processing_velocity"].number();
+    const double fdc = theTruth["doppler"]["centroid"].number();
+    const CJson& aVel = theTruth["orbit"]["state_vectors"]["vel"][4];
+    const double aPlatform = std::hypot(aVel[std::size_t{0}].number(), aVel[1].number(), aVel[2].number());
+    const double aAntenna = radar["antenna_length"].number();
+    const int aLines = (*aHeader)["RasterInfo.NrOfLinesPerImage"].getInteger();
+    const int aWidth = static_cast<int>(radar["compressed_width"].number());
+    const double dr = c / (2.0 * fs);
+
+    CDescriptionHeader& h = *aHeader;
+    h["RasterInfo.CellType"].setValue("FLOAT_COMPLEX");
+    h["RasterInfo.RowPrefix"].setValue(0);
+    h["RasterInfo.NrOfPixelsPerLine"].setValue(aWidth);
+    h["Processing.SlantRange"].resize(1, 3);
+    for (int k = 0; k < 3; ++k) h["Processing.SlantRange"].setValue(k, aRNear + k * (aWidth - 1) / 2.0 * dr);
+    ASSERT_TRUE(h.write((theRc.string() + "_hdr").c_str(), true, false));
+    CRasterFileParam aParam;
+    fqorvRasterParamFromHeader(h, theRc.c_str(), aParam);
+    CRasterFile aOut;
+    aOut.openWrite(CQORV_RF_OPEN_WRITE, aParam);
+
+    const int n = 1024;  // range transform of one target's pulse
+    const std::vector<fcomplex> aBand = fqorvIrfKaiserBand(n, fs, radar["bandwidth"].number(), 0.0, 2.12);
+    FftPlan1D aInverse(n, FftDirection::Inverse);
+    std::vector<fcomplex> aLine(aWidth), aPulse(n);
+    for (int l = 0; l < aLines; ++l) {
+        std::fill(aLine.begin(), aLine.end(), fcomplex(0.0f, 0.0f));
+        for (std::size_t k = 0; k < theTruth["targets"].size(); ++k) {
+            const CJson& t = theTruth["targets"][k];
+            const double r0 = t["slant_range"].number();
+            const double x = v * (l - t["expected_line"].number()) / prf;
+            const double r = std::sqrt(r0 * r0 + x * x);
+            const double fd = -2.0 * v * x / (lambda * r);
+            if (std::fabs(fd - fdc) > 0.5 * prf) continue;
+            const double u = aAntenna * (fd - fdc) / (2.0 * aPlatform);
+            const double aSinc = u == 0.0 ? 1.0 : std::sin(M_PI * u) / (M_PI * u);
+            const double aDelay = (r - aRNear) / dr;
+            const int aCentre = static_cast<int>(std::lround(aDelay));
+            for (int b = 0; b < n; ++b) {
+                const int g = b <= n / 2 ? b : b - n;
+                const double aPhase = -4.0 * M_PI * r / lambda - 2.0 * M_PI * g * (aDelay - aCentre + n / 2) / n;
+                aPulse[b] = aBand[b] * fcomplex(std::polar(aSinc * aSinc / n, aPhase));
+            }
+            aInverse.execute(aPulse.data());
+            for (int s = 0; s < n; ++s) {
+                const int p = aCentre - n / 2 + s;
+                if (p >= 0 && p < aWidth) aLine[p] += aPulse[s];
+            }
+        }
+        fqorvWriteLine(aOut, aLine.data(), l);
+    }
+    aOut.close();
+}
+
+/// Measures the isolated targets of an SLC with qorvex_irf and holds them to the ideal responses:
+/// position within 0.1 pixel and 0.25 line, widths within 5 %, PSLR and ISLR within 1.5 dB.
+void fExpectIdealTargets(const qtest::DriverSandbox& theBox, const std::filesystem::path& theSlc,
+                         const std::filesystem::path& theTruth, std::size_t theTargets)
+{
+    const auto aReport = theSlc.string() + "_irf.json";
+    const qtest::RunResult aIrf = qtest::runProgram(
+        qtest::binaryDir() / "qorvex_irf",
+        {"--slc", theSlc.string(), "--truth", theTruth.string(), "--json", aReport, "--only-isolated"},
+        {{"QORVEX_INIT_DIR", theBox.etc().string()}}, theBox.data());
+    ASSERT_EQ(aIrf.mStatus, 0) << aIrf.mStdout << aIrf.mStderr;
+    SCOPED_TRACE(aIrf.mStdout);
+    const CJson aResult = CJson::parseFile(aReport);
+    const CJson& aIdeal = aResult["ideal"];
+    ASSERT_EQ(aResult["targets"].size(), theTargets);
+    for (std::size_t k = 0; k < aResult["targets"].size(); ++k) {
+        const CJson& t = aResult["targets"][k];
+        SCOPED_TRACE(t["id"].string());
+        ASSERT_TRUE(t["found"].boolean());
+        EXPECT_NEAR(t["line_error"].number(), 0.0, 0.25);
+        EXPECT_NEAR(t["pixel_error"].number(), 0.0, 0.1);
+        for (const char* aDir : {"range", "azimuth"}) {
+            EXPECT_NEAR(t[aDir]["irw"].number() / aIdeal[aDir]["irw"].number(), 1.0, 0.05) << aDir;
+            EXPECT_NEAR(t[aDir]["pslr_db"].number(), aIdeal[aDir]["pslr_db"].number(), 1.5) << aDir;
+            EXPECT_NEAR(t[aDir]["islr_db"].number(), aIdeal[aDir]["islr_db"].number(), 1.5) << aDir;
+        }
+    }
+}
+
+TEST(FocusDriver, SimulatedErsTargetsFocusToTheirIdealResponses)
+{
+    qtest::DriverSandbox aBox;
+    const auto aRaw = aBox.data() / "ers_raw";
+    const auto aTruthFile = aBox.data() / "ers_raw_truth.json";
+    const qtest::RunResult aSim = qtest::runProgram(
+        qtest::binaryDir() / "qorvex_simulate",
+        {"--lines", "6144", "--samples", "1024", "--targets", "grid:3x2", "--write-doppler", "--no-noise", "--quiet",
+         "--out", aRaw.string(), "--config", aBox.etc().string()},
+        {}, aBox.data());
+    ASSERT_EQ(aSim.mStatus, 0) << aSim.mStderr;
+    const CJson aTruth = CJson::parseFile(aTruthFile.string());
+    {
+        qtest::InProcessEnvironment aEnv;
+        fWriteRangeCompressed(aRaw, aBox.data() / "ers_rc", aTruth);
+    }
+    // Steps 0 and 5 through the driver: one block of 8192 lines; the other steps are off.
+    auto aArgs = qtest::DriverSandbox::defaultArguments(aRaw, aBox.data() / "ers_slc");
+    aArgs[15] = aArgs[16] = aArgs[17] = "OK";
+    const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aArgs));
+    ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr << qtest::readFile(aBox.workingFile());
+    EXPECT_FALSE(std::filesystem::exists(aBox.data() / "ers_slc_tmp"));
+    fExpectIdealTargets(aBox, aBox.data() / "ers_slc", aTruthFile, 6);
+
+    // The same step with blocks of 4096 lines: a first block, then a last one moved back over it.
+    {
+        qtest::InProcessEnvironment aEnv;
+        std::vector<std::string> aStepArgs = {"SAR azimuth omega/k processor", (aBox.data() / "ers_rc").string(),
+                                              (aBox.data() / "ers_blocks_slc").string(),
+                                              (aBox.data() / "ers_par").string(), "1", "1", "4096", "0", "0"};
+        std::vector<char*> aArgv;
+        for (std::string& a : aStepArgs) aArgv.push_back(a.data());
+        ASSERT_EQ(qorv_az_SLC(static_cast<int>(aArgv.size()), aArgv.data()), 0);
+        const std::string aTrace = aEnv.trace();
+        EXPECT_NE(aTrace.find("Wrote Block 0"), std::string::npos);
+        EXPECT_NE(aTrace.find("  back = "), std::string::npos);
+    }
+    fExpectIdealTargets(aBox, aBox.data() / "ers_blocks_slc", aTruthFile, 6);
+}
+
+}  // namespace
