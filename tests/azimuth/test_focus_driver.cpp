@@ -150,6 +150,23 @@ TEST(FocusDriver, SimulatedErsTargetsFocusToTheirIdealResponses)
         EXPECT_NE(aTrace.find("  back = "), std::string::npos);
     }
     fExpectIdealTargets(aBox, aBox.data() / "ers_blocks_slc", aTruthFile, 6);
+
+    // State vectors announced without velocities: failure 848642 naming the field, and no product.
+    {
+        qtest::InProcessEnvironment aEnv;
+        auto aHeader = CDescriptionHeader::makeFull();
+        const std::string aRcHeader = (aBox.data() / "ers_rc_hdr").string();
+        ASSERT_TRUE(aHeader->read(aRcHeader.c_str(), true));
+        (*aHeader)["StateVectorData.vel_x"].reset();
+        ASSERT_TRUE(aHeader->write(aRcHeader.c_str(), true, false));
+    }
+    aArgs[2] = (aBox.data() / "broken_slc").string();
+    std::filesystem::copy_file(aBox.data() / "ers_rc", aBox.data() / "broken_rc");
+    std::filesystem::copy_file(aBox.data() / "ers_rc.sml", aBox.data() / "broken_rc.sml");
+    const qtest::RunResult aBroken = aBox.run(aBox.writeArguments(aArgs));
+    EXPECT_EQ(aBroken.mExitId, 848642) << aBroken.mStderr;
+    EXPECT_NE(aBox.trace().find("Missing mandatory field vel in file"), std::string::npos);
+    EXPECT_FALSE(std::filesystem::exists(aBox.data() / "broken_slc"));
 }
 
 }  // namespace
