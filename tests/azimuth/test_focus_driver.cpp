@@ -147,6 +147,16 @@ TEST(FocusDriver, SimulatedErsTargetsFocusToTheirIdealResponses)
     const auto aTruthFile = aBox.data() / "ers_raw_truth.json";
     auto aArgs = fSimulateAndFocus(aBox, {"--lines", "6144", "--samples", "1024", "--targets", "grid:3x2"});
     EXPECT_FALSE(std::filesystem::exists(aBox.data() / "ers_slc_tmp"));
+#if __has_include("qorv_raster_utility.h")
+    {  // the normalisation ran on the product and its factor reached the final header
+        qtest::InProcessEnvironment aEnv;
+        auto aSlc = CDescriptionHeader::makeFull();
+        ASSERT_TRUE(aSlc->read((aBox.data() / "ers_slc_hdr").c_str(), true));
+        std::string aFactor;
+        EXPECT_TRUE(fqorvGetUserKey(*aSlc, "NORMALIZATION FACTOR", aFactor));
+        EXPECT_GT(std::atof(aFactor.c_str()), 0.0);
+    }
+#endif
     fExpectIdealTargets(aBox, aBox.data() / "ers_slc", aTruthFile, 6);
 
     // The same step with blocks of 4096 lines: a first block, then a last one moved back over it.
