@@ -3,7 +3,9 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <cstdlib>
 #include <filesystem>
+#include <string>
 #include <vector>
 
 #include "qorv_az_SLC.h"
