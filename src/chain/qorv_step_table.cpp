@@ -6,6 +6,7 @@
 #include "qorv_enviroment.h"
 #include "qorv_errors.h"
 #include "qorv_generic_utility.h"
+#include "qorv_az_SLC.h"
 #include "qorv_multi_SLC.h"
 #include "qorv_proc_param.h"
 #include "qorv_raster_to_geotiff.h"
@@ -47,13 +48,6 @@ int shutDopplerAmbiguity(int theArgc, char** theArgv)
     return 1;
 }
 
-/// Omega-k focusing: removes its argument 1, the range compressed file.
-int shutFocusing(int theArgc, char** theArgv)
-{
-    if (theArgc > 1) removeFile(theArgv[1]);
-    return 1;
-}
-
 }  // namespace
 
 int fdfDefaultShut(int, char**) { return 1; }
@@ -64,7 +58,7 @@ const CStepRow CQORV_STEP_TABLE[CQORV_STEP_NBR] = {
     {"range compression", stepNotBuilt, fdfDefaultShut},
     {"autofocus", stepNotBuilt, fdfDefaultShut},
     {"doppler ambiguity", stepNotBuilt, shutDopplerAmbiguity},
-    {"SAR azimuth omega/k processor", stepNotBuilt, shutFocusing},
+    {"SAR azimuth omega/k processor", qorv_az_SLC, qorv_az_SLC_shut},
     {"multi look", qorv_multi_SLC, fdfDefaultShut},
     {"multi look to tiff conversion", qorv_raster_to_geotiff, fdfDefaultShut},
     {"slc to tiff conversion", qorv_raster_to_geotiff, fdfDefaultShut},
