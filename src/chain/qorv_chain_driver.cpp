@@ -134,11 +134,18 @@ void CChainRun::checkProductNames() const
     std::set<std::string> aInputs;
     for (const std::string& aFile : mFileList) aInputs.insert(fileIdentity(aFile));
     if (mFromList) aInputs.insert(fileIdentity(mArgs[0]));
-    static const char* const CPRODUCT_SUFFIXES[] = {"_par", "_azsp", "_rc", "_slc", "_pwr", "_pwr.tif", "_slc.tif",
-                                                    "_rc__amb1_mli", "_rc__amb2_mli", "_ref_rc"};
+    // Only what a step of this run writes counts: step 8 alone reads the SLC it converts.
+    static const char* const CWRITTEN_BY_STEP[][3] = {
+        {"_par", nullptr, nullptr}, {"_azsp", nullptr, nullptr}, {"_rc", "_ref_rc", nullptr},
+        {nullptr, nullptr, nullptr}, {"_rc__amb1_mli", "_rc__amb2_mli", nullptr}, {"_slc", nullptr, nullptr},
+        {"_pwr", nullptr, nullptr}, {"_pwr.tif", nullptr, nullptr}, {"_slc.tif", nullptr, nullptr}};
+    std::set<std::string> aSuffixes;
+    for (int aStep : stepList())
+        for (const char* aSuffix : CWRITTEN_BY_STEP[aStep])
+            if (aSuffix != nullptr) aSuffixes.insert(aSuffix);
     for (int aFile = 0; aFile < nbrOfFiles(); ++aFile) {
         const std::string aRoot = productRoot(aFile);
-        for (const char* aSuffix : CPRODUCT_SUFFIXES) {
+        for (const std::string& aSuffix : aSuffixes) {
             const std::string aProduct = aRoot + aSuffix;
             if (aInputs.count(fileIdentity(aProduct)) == 0) continue;
             fdfTrace("\nThe product %s would overwrite an input of this run\n", aProduct.c_str());
