@@ -20,6 +20,7 @@
 #include "qorv_enviroment.h"
 #include "qorv_errors.h"
 #include "qorv_fir.h"
+#include "qorv_generic_utility.h"
 #include "qorv_geometry_setup.h"
 #include "qorv_identifiers.h"
 #include "qorv_multi_SLC.h"
@@ -503,7 +504,7 @@ void fProcessBlocks(YDF_SAR& theSar, CRasterFile& theIn, CRasterFile& theOut, CA
     aKernel.mPresumming = p.psf;
     aKernel.mDecimation = p.ndec;
     aKernel.mHalfPixelShift = p.mHalfPixelShift;
-    const int aThreads = static_cast<int>(std::max(1u, std::thread::hardware_concurrency()));
+    const int aThreads = fqorvThreadCount();
     fqorvFftSetThreads(aThreads);
     COmegaKBlockFocuser aFocuser(aKernel, aThreads);
     fdfTrace("SAR data buffer size (bytes): %zu\n", static_cast<std::size_t>(p.nazft) * p.nrfft * sizeof(fcomplex));

@@ -1,6 +1,7 @@
 #include "qorv_generic_utility.h"
 
 #include <strings.h>
+#include <sched.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
@@ -9,7 +10,9 @@
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
+#include <algorithm>
 #include <fstream>
+#include <thread>
 
 void QorvFreeDeleter::operator()(char* p) const noexcept { std::free(p); }
 
@@ -213,3 +216,15 @@ long largestPowerOfTwo(long n)
 }
 
 }  // namespace NQORV_UTILITY
+
+int fqorvThreadCount()
+{
+    if (const char* aValue = std::getenv("QORVEX_THREADS")) {
+        const long aThreads = std::strtol(aValue, nullptr, 10);
+        if (aThreads > 0) return static_cast<int>(std::min(aThreads, 256L));
+    }
+    cpu_set_t aSet;
+    CPU_ZERO(&aSet);
+    if (sched_getaffinity(0, sizeof(aSet), &aSet) == 0 && CPU_COUNT(&aSet) > 0) return CPU_COUNT(&aSet);
+    return static_cast<int>(std::max(1u, std::thread::hardware_concurrency()));
+}

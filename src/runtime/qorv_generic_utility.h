@@ -39,6 +39,9 @@ bool fqorvEndsWith(const std::string& a, const std::string& b);
 std::string fqorvCutSuffix(std::string a, const std::string& b);
 inline bool fqorvFileExists(const std::string& a) { return fqorvFileExists(a.c_str()); }
 std::string fqorvStringFormat(const char* format, ...) __attribute__((format(printf, 1, 2)));
+/// Threads for the large transforms and the per-sample loops: QORVEX_THREADS when it holds a
+/// positive number, else the processors this process may run on (its affinity mask), at least 1.
+int fqorvThreadCount();
 
 /// Writes a whole text under a temporary name beside thePath and renames it into place, so that a
 /// full or failing disk leaves the old file (or none), never an empty or cut one. False on failure.

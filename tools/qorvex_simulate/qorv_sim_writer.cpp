@@ -10,6 +10,7 @@
 
 #include "qorv_cell_types.h"
 #include "qorv_description_section.h"
+#include "qorv_generic_utility.h"
 #include "qorv_raster_file.h"
 #include "qorv_sim_echo.h"
 #include "qorv_sim_format.h"
@@ -30,7 +31,7 @@ double secondsSince(std::chrono::steady_clock::time_point theStart)
 
 int threadCount(const CSimScene& s)
 {
-    const int aHardware = static_cast<int>(std::max(1u, std::thread::hardware_concurrency()));
+    const int aHardware = fqorvThreadCount();
     return std::clamp(s.mThreads > 0 ? s.mThreads : aHardware, 1, 64);
 }
 
