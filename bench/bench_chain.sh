@@ -1,0 +1,48 @@
+#!/usr/bin/env bash
+# Focuses a full ERS frame (28,000 lines x 5,616 samples, 300 targets) through the driver: parameters,
+# range compression and omega-k focusing (steps 0, 2 and 5), on one thread and on two. For each run
+# it prints the wall time, the peak memory, the time of each step, and the ratio of the wall time to
+# the FFT work of the same run (the range line transforms and the omega-k blocks, measured by
+# bench_chain_fft right after it with the same thread count), then the point targets' worst figures.
+#
+#   bench/bench_chain.sh [build/bin]        (scratch files under $TMPDIR, about 3 GB, removed at the end)
+set -euo pipefail
+top=$(cd "$(dirname "$0")/.." && pwd)
+bin=$(cd "${1:-$top/build/bin}" && pwd)
+dir=$(mktemp -d "${TMPDIR:-/tmp}/qorvex-bench-chain-XXXXXX")
+trap 'rm -rf "$dir"' EXIT
+mkdir -p "$dir/work" "$dir/etc"
+"$top/tools/qorvex-make-config" --share "$top/share/qorvex" --exe "$bin" --work "$dir/work" --out "$dir/etc" >/dev/null
+export QORVEX_INIT_DIR="$dir/etc"
+export QORVEX_WORKING_FILE="$dir/work/bench.working"
+
+echo "== simulating a full ERS frame"
+"$bin/qorvex_simulate" --preset ers2 --full-frame --write-doppler --no-noise --quiet --out "$dir/ers_raw"
+
+# Steps 0, 2 and 5: focusing, no multi-look, no TIFF, no ambiguity; steps 1 and 3 skipped.
+printf '%s\n' "bench: full ERS frame" "$dir/ers_raw" OK "$dir/ers_slc" 1 5 NotOK NotOK NotOK 0.333 0 NotOK \
+  NotOK NotOK NotOK NotOK OK NotOK OK NotOK 1 > "$dir/args.txt"
+
+for threads in 1 2; do
+  rm -f "$dir"/ers_rc* "$dir"/ers_slc* "$dir"/ers_par* "$dir/work/Process.trace"
+  printf '0\nbench\n' > "$QORVEX_WORKING_FILE"
+  QORVEX_THREADS=$threads /usr/bin/time -f '%e %M' -o "$dir/time.txt" "$bin/qorvex" "$dir/args.txt" \
+    2> "$dir/stderr.txt" || { cat "$dir/stderr.txt"; exit 1; }
+  read -r wall rss < "$dir/time.txt"
+  trace="$dir/work/Process.trace"
+  lines=$(sed -n 's/.*<NrOfLinesPerImage>\([0-9]*\)<.*/\1/p' "$dir/ers_raw.sml" | head -1)
+  rgfft=$(sed -n 's/.*<NrOfPixelsPerLine>\([0-9]*\)<.*/\1/p' "$dir/ers_raw.sml" | head -1)
+  nazft=$(sed -n 's/^Number of lines in every processed block: //p' "$trace" | head -1)
+  bytes=$(sed -n 's/^SAR data buffer size (bytes): //p' "$trace" | head -1)
+  nrfft=$((bytes / 8 / nazft))
+  blocks=$(grep -c '^Processing lines \[' "$trace")
+  fft=$(QORVEX_THREADS=$threads "$bin/bench_chain_fft" "$lines" "$rgfft" "$blocks" "$nazft" "$nrfft" "$threads")
+  fftsec=$(sed -n 's/.*FFT work \([0-9.]*\) s.*/\1/p' <<< "$fft")
+  echo "== $threads thread(s): wall $wall s, peak memory $((rss / 1024)) MB, $blocks blocks of $nazft x $nrfft"
+  sed -n 's/^DURATION \[\(.*\)\]  (s) = \(.*\)/   step "\1": \2 s/p' "$trace"
+  echo "   FFT work alone: $fft"
+  awk -v w="$wall" -v f="$fftsec" 'BEGIN { printf "   ratio of the wall time to the FFT work: %.2f\n", w / f }'
+done
+
+echo "== point targets of the SLC against the simulator's truth (worst case)"
+"$bin/qorvex_irf" --slc "$dir/ers_slc" --truth "$dir/ers_raw_truth.json" --json "$dir/irf.json" | tail -n 6
