@@ -9,7 +9,7 @@
 #include <cstring>
 
 #include "qorv_fft.h"
-#include "qorv_omegak_kernel.h"
+#include "bench_ers_block.h"
 
 namespace {
 
@@ -43,15 +43,7 @@ int main(int argc, char** argv)
     }
     const double aRange = fSince(t0);
 
-    COmegaKParam p;
-    p.mAzimuthFftSize = std::atoi(argv[4]);
-    p.mRangeFftSize = std::atoi(argv[5]);
-    p.mPrf = 1679.9;
-    p.mSamplingRate = 18.96e6;
-    p.mCarrierFrequency = 5.3e9;
-    p.mVelocity = 7100.0;
-    p.mNearRange = 845000.0;
-    p.mBandFraction = 0.8;
+    const COmegaKParam p = fqorvBenchErsBlock(std::atoi(argv[4]), std::atoi(argv[5]));
     fqorvFftSetThreads(aThreads);
     double aAzimuth = 0.0;
     if (aBlocks > 0) {

@@ -9,7 +9,7 @@
 #include <functional>
 
 #include "qorv_fft.h"
-#include "qorv_omegak_kernel.h"
+#include "bench_ers_block.h"
 
 namespace {
 
@@ -31,15 +31,7 @@ void fFill(COmegaKBlockFocuser& theFocuser)
 
 int main(int argc, char** argv)
 {
-    COmegaKParam p;
-    p.mAzimuthFftSize = argc > 1 ? std::atoi(argv[1]) : 8192;
-    p.mRangeFftSize = argc > 2 ? std::atoi(argv[2]) : 5616;
-    p.mPrf = 1679.9;
-    p.mSamplingRate = 18.96e6;
-    p.mCarrierFrequency = 5.3e9;
-    p.mVelocity = 7100.0;
-    p.mNearRange = 845000.0;
-    p.mBandFraction = 0.8;
+    const COmegaKParam p = fqorvBenchErsBlock(argc > 1 ? std::atoi(argv[1]) : 8192, argc > 2 ? std::atoi(argv[2]) : 5616);
     std::printf("omega-k block %d x %d\n", p.mAzimuthFftSize, p.mRangeFftSize);
     for (int aThreads : {1, 2}) {
         fqorvFftSetThreads(aThreads);
