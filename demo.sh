@@ -51,9 +51,9 @@ if [ "$status" -eq 0 ]; then
 fi
 
 echo "== products in $out"
-for f in ers_demo_raw ers_demo_raw.sml ers_demo_raw_truth.json ers_demo_par ers_demo_rc ers_demo_slc \
-         ers_demo_slc_hdr ers_demo_slc.hdr ers_demo_slc.tif ers_demo_pwr ers_demo_pwr_hdr ers_demo_pwr.hdr \
-         ers_demo_pwr.tif; do
+for f in ers_demo_raw ers_demo_raw.sml ers_demo_raw_truth.json ers_demo_par.sml ers_demo_rc ers_demo_rc.sml \
+         ers_demo_slc ers_demo_slc.sml ers_demo_slc.hdr ers_demo_slc.tif ers_demo_pwr ers_demo_pwr.sml \
+         ers_demo_pwr.hdr ers_demo_pwr.tif; do
   if [ -e "$out/$f" ]; then
     printf '   %-26s %12s bytes\n' "$f" "$(stat -c %s "$out/$f")"
   else
@@ -62,7 +62,7 @@ for f in ers_demo_raw ers_demo_raw.sml ers_demo_raw_truth.json ers_demo_par ers_
 done
 echo "   log and trace: $out/work/Process.log, $out/work/Process.trace"
 
-if [ -e "$out/ers_demo_slc_hdr" ]; then
+if [ -e "$out/ers_demo_slc.sml" ]; then
   echo "== point targets of the SLC against the simulator's truth"
   "$bin/qorvex_irf" --slc "$out/ers_demo_slc" --truth "$out/ers_demo_raw_truth.json" --json "$out/ers_demo_irf.json"
 fi

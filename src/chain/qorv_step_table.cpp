@@ -8,6 +8,7 @@
 #include "qorv_generic_utility.h"
 #include "qorv_az_SLC.h"
 #include "qorv_multi_SLC.h"
+#include "qorv_pre_rc.h"
 #include "qorv_proc_param.h"
 #include "qorv_raster_to_geotiff.h"
 
@@ -55,7 +56,7 @@ int fdfDefaultShut(int, char**) { return 1; }
 const CStepRow CQORV_STEP_TABLE[CQORV_STEP_NBR] = {
     {"Processing parameters construction", qorv_proc_param, fdfDefaultShut},
     {"SAR IQ raw data azimuth spectrum", stepNotBuilt, shutAzimuthSpectrum},
-    {"range compression", stepNotBuilt, fdfDefaultShut},
+    {"range compression", qorv_pre_rc, fdfDefaultShut},
     {"autofocus", stepNotBuilt, fdfDefaultShut},
     {"doppler ambiguity", stepNotBuilt, shutDopplerAmbiguity},
     {"SAR azimuth omega/k processor", qorv_az_SLC, qorv_az_SLC_shut},
