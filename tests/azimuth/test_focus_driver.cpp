@@ -14,6 +14,7 @@
 #include "qorv_irf_ideal.h"
 #include "qorv_json.h"
 #include "qorv_raster_file.h"
+#include "qorvex_irf_check.h"
 #include "qorvex_test_support.h"
 #include "tools_raster_file_exp.h"
 
@@ -85,40 +86,6 @@ void fWriteRangeCompressed(const std::filesystem::path& theRaw, const std::files
     aOut.close();
 }
 
-/// Measures the isolated targets of an SLC with qorvex_irf and holds them to the ideal responses:
-/// position within 0.1 pixel and 0.25 line, widths within 5 %, PSLR and ISLR within 1.5 dB.
-/// theTargets 0: any number of targets, and the table is printed.
-void fExpectIdealTargets(const qtest::DriverSandbox& theBox, const std::filesystem::path& theSlc,
-                         const std::filesystem::path& theTruth, std::size_t theTargets)
-{
-    const auto aReport = theSlc.string() + "_irf.json";
-    const qtest::RunResult aIrf = qtest::runProgram(
-        qtest::binaryDir() / "qorvex_irf",
-        {"--slc", theSlc.string(), "--truth", theTruth.string(), "--json", aReport, "--only-isolated"},
-        {{"QORVEX_INIT_DIR", theBox.etc().string()}}, theBox.data());
-    ASSERT_EQ(aIrf.mStatus, 0) << aIrf.mStdout << aIrf.mStderr;
-    SCOPED_TRACE(aIrf.mStdout);
-    const CJson aResult = CJson::parseFile(aReport);
-    const CJson& aIdeal = aResult["ideal"];
-    if (theTargets > 0) {
-        ASSERT_EQ(aResult["targets"].size(), theTargets);
-    } else {
-        std::printf("%s", aIrf.mStdout.c_str());
-    }
-    for (std::size_t k = 0; k < aResult["targets"].size(); ++k) {
-        const CJson& t = aResult["targets"][k];
-        SCOPED_TRACE(t["id"].string());
-        ASSERT_TRUE(t["found"].boolean());
-        EXPECT_NEAR(t["line_error"].number(), 0.0, 0.25);
-        EXPECT_NEAR(t["pixel_error"].number(), 0.0, 0.1);
-        for (const char* aDir : {"range", "azimuth"}) {
-            EXPECT_NEAR(t[aDir]["irw"].number() / aIdeal[aDir]["irw"].number(), 1.0, 0.05) << aDir;
-            EXPECT_NEAR(t[aDir]["pslr_db"].number(), aIdeal[aDir]["pslr_db"].number(), 1.5) << aDir;
-            EXPECT_NEAR(t[aDir]["islr_db"].number(), aIdeal[aDir]["islr_db"].number(), 1.5) << aDir;
-        }
-    }
-}
-
 /// Simulates an ERS scene "ers_raw" (noise-free, true centroid in the header), writes its range
 /// compressed product "ers_rc" and runs steps 0 and 5 through the driver into "ers_slc" (one block
 /// of 8192 lines; the other steps off). Returns the driver's arguments.
@@ -157,7 +124,7 @@ TEST(FocusDriver, SimulatedErsTargetsFocusToTheirIdealResponses)
         EXPECT_TRUE(fqorvGetUserKey(*aSlc, "NORMALIZATION FACTOR", aFactor));
         EXPECT_GT(std::atof(aFactor.c_str()), 0.0);
     }
-    fExpectIdealTargets(aBox, aBox.data() / "ers_slc", aTruthFile, 6);
+    qtest::expectIdealTargets(aBox, aBox.data() / "ers_slc", aTruthFile, 6);
 
     // The same step with blocks of 4096 lines: a first block, then a last one moved back over it.
     {
@@ -172,7 +139,7 @@ TEST(FocusDriver, SimulatedErsTargetsFocusToTheirIdealResponses)
         EXPECT_NE(aTrace.find("Wrote Block 0"), std::string::npos);
         EXPECT_NE(aTrace.find("  back = "), std::string::npos);
     }
-    fExpectIdealTargets(aBox, aBox.data() / "ers_blocks_slc", aTruthFile, 6);
+    qtest::expectIdealTargets(aBox, aBox.data() / "ers_blocks_slc", aTruthFile, 6);
 
     // State vectors announced without velocities: failure 848642 naming the field, and no product.
     {
@@ -202,7 +169,7 @@ TEST(FocusDriver, DISABLED_FullFrame)
     const std::size_t aAt = aTrace.find("DURATION [ SAR azimuth omega/k processor]");
     ASSERT_NE(aAt, std::string::npos);
     std::printf("%s\n", aTrace.substr(aAt, aTrace.find('\n', aAt) - aAt).c_str());
-    fExpectIdealTargets(aBox, aBox.data() / "ers_slc", aBox.data() / "ers_raw_truth.json", 0);
+    qtest::expectIdealTargets(aBox, aBox.data() / "ers_slc", aBox.data() / "ers_raw_truth.json", 0);
 }
 
 }  // namespace
