@@ -235,6 +235,39 @@ TEST(RangeCompressionDriver, LostRepeatedAndShiftedLinesKeepEveryEchoInPlace)
     qtest::expectIdealTargets(aBox, aBox.data() / "scene_slc", aBox.data() / "raw_truth.json", 4);
 }
 
+TEST(RangeCompressionDriver, ThePrefilterRoadDecimatesAndKeepsTheRangeResponse)
+{
+    // Presumming by 2 from the parameter file: half the lines, each a filtered sum of 17 echoes
+    // around the Doppler centroid; a target's range cut at its beam-centre time is unchanged.
+    qtest::DriverSandbox aBox;
+    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "2048", "--samples", "1280", "--targets", "grid:2x2",
+                                             "--write-doppler", "--no-noise", "--quiet", "--out", (aBox.data() / "raw").string(),
+                                             "--config", aBox.etc().string()};
+    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+    {
+        qtest::InProcessEnvironment aEnv;
+        CDescriptionHeader p({"sar_processing"});
+        p["sar_processing.Channel"].setValue("VV");
+        for (const char* aKey : {"sar_processing.FirstPixel", "sar_processing.FirstLine"}) p[aKey].setValue(0);
+        p["sar_processing.ProcessedLines"].setValue(2048);
+        p["sar_processing.RgFFT"].setValue(1280);
+        p["sar_processing.AzPresumming"].setValue(2);
+        p["sar_processing.AzBandWidthFraction"].setValue(0.8);
+        ASSERT_TRUE(p.write((aBox.data() / "scene_par").c_str(), true, false));
+    }
+    auto aArgs = qtest::DriverSandbox::defaultArguments(aBox.data() / "raw", aBox.data() / "scene_slc");
+    aArgs[14] = aArgs[15] = aArgs[17] = "OK";
+    aBox.run(aBox.writeArguments(aArgs), {}, 600);  // step 5 may refuse the decimated lines; step 2 is measured
+    ASSERT_TRUE(fs::exists(aBox.data() / "scene_rc"));
+    CJson aTruth = CJson::parseFile((aBox.data() / "raw_truth.json").string());
+    // 1024 lines of 1280 - 352 samples: the 704 replica points are halved to fit half the line.
+    EXPECT_EQ(fs::file_size(aBox.data() / "scene_rc"), 1024u * (1280u - 352u) * 8u);
+    EXPECT_TRUE(fs::exists(aBox.data() / "scene_rcprefiller.dat"));
+    // Output line k stands for the input lines around 2 k: the cut's row is the beam-centre line / 2.
+    aTruth["timing"]["line_time"] = CJson(2.0 * aTruth["timing"]["line_time"].number());
+    fExpectIdealRangeCuts(aBox.data() / "scene_rc", aTruth);
+}
+
 TEST(RangeCompressionDriver, TheIndependentSceneFocusesToItsPublishedResponses)
 {
     const fs::path aScene = fs::path(QORVEX_OUTSIDE_SCENE_DIR);
