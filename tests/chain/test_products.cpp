@@ -1,0 +1,99 @@
+// The chain's products read by an outside client: a simulated ERS scene through steps 0, 2, 5, 6
+// and 7, then step 8 on the SLC; GDAL opens the SLC and the power image through their ENVI headers
+// and both TIFFs, and its sizes, types and pixel values agree with what the chain wrote.
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <cstdlib>
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include "qorv_description_section.h"
+#include "qorv_raster_file.h"
+#include "qorvex_test_support.h"
+#include "tools_raster_file_exp.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+
+std::string fGdal(const char* theProgram, const std::vector<std::string>& theArgs)
+{
+    const qtest::RunResult r = qtest::runProgram(fs::path("/usr/bin") / theProgram, theArgs, {}, fs::temp_directory_path());
+    EXPECT_EQ(r.mStatus, 0) << r.mStderr;
+    return r.mStdout;
+}
+
+/// Width, lines and one pixel (line, pixel) of a raster of the chain, read with the project's code.
+struct CRasterSample {
+    int mPixels = 0, mLines = 0;
+    fcomplex mValue;
+};
+
+CRasterSample fReadOwn(const fs::path& theRaster, int theLine, int thePixel)
+{
+    qtest::InProcessEnvironment aEnv;
+    auto h = CDescriptionHeader::makeFull();
+    EXPECT_TRUE(h->read((theRaster.string() + "_hdr").c_str(), true));
+    CRasterFileParam p;
+    fqorvRasterParamFromHeader(*h, theRaster.c_str(), p);
+    CRasterFile f;
+    f.openRead(p);
+    std::vector<fcomplex> aLine(static_cast<std::size_t>(p.mNrOfPixelsPerLine));
+    fqorvReadLine(f, aLine.data(), theLine);
+    return {p.mNrOfPixelsPerLine, p.mNrOfLinesPerImage, aLine[static_cast<std::size_t>(thePixel)]};
+}
+
+TEST(ChainProducts, GdalReadsEveryProductAsTheChainWroteIt)
+{
+    qtest::DriverSandbox aBox;
+    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "3072", "--samples", "1280", "--targets", "grid:2x2",
+                                             "--write-doppler", "--quiet", "--out", (aBox.data() / "scene_raw").string(),
+                                             "--config", aBox.etc().string()};
+    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+    auto aArgs = qtest::DriverSandbox::defaultArguments(aBox.data() / "scene_raw", aBox.data() / "scene_slc");
+    aArgs[5] = aArgs[6] = "OK";    // multi-look and TIFF
+    aArgs[15] = aArgs[17] = "OK";  // no Doppler estimation, no autofocus
+    qtest::RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 600);
+    ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr << qtest::readFile(aBox.workingFile());
+    auto aSlcArgs = qtest::DriverSandbox::defaultArguments(aBox.data() / "scene_slc", aBox.data() / "scene_pwr");
+    aSlcArgs[1] = "NotOK";
+    aSlcArgs[6] = aSlcArgs[14] = aSlcArgs[15] = aSlcArgs[16] = aSlcArgs[17] = "OK";
+    aRun = aBox.run(aBox.writeArguments(aSlcArgs, "args_slc_tiff.txt"), {}, 600);
+    ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr;
+
+    // The SLC's TIFF keeps every cell; the power image's is sized toward square: 928 x 614 cells
+    // become 464 x 614 pixels of 2 x 1 cells.
+    struct CProduct {
+        const char* mName;
+        const char* mType;
+        int mTiffColumnWindow;
+    };
+    for (const CProduct& c : {CProduct{"scene_slc", "CFloat32", 1}, CProduct{"scene_pwr", "Float32", 2}}) {
+        SCOPED_TRACE(c.mName);
+        const fs::path aRaster = aBox.data() / c.mName;
+        const CRasterSample aOwn = fReadOwn(aRaster, 200, 300);
+        const std::string aInfo = fGdal("gdalinfo", {aRaster.string()});
+        EXPECT_NE(aInfo.find("Driver: ENVI/"), std::string::npos) << aInfo;
+        EXPECT_NE(aInfo.find("Size is " + std::to_string(aOwn.mPixels) + ", " + std::to_string(aOwn.mLines)), std::string::npos) << aInfo;
+        EXPECT_NE(aInfo.find("Type=" + std::string(c.mType)), std::string::npos) << aInfo;
+        const std::string aValue = fGdal("gdallocationinfo", {"-valonly", aRaster.string(), "300", "200"});
+        if (c.mType[0] == 'C') {
+            float aRe = 0.0f, aIm = 0.0f;
+            ASSERT_EQ(std::sscanf(aValue.c_str(), "%f%f", &aRe, &aIm), 2) << aValue;
+            EXPECT_FLOAT_EQ(aRe, aOwn.mValue.real());
+            EXPECT_FLOAT_EQ(aIm, aOwn.mValue.imag());
+        } else {
+            EXPECT_FLOAT_EQ(std::strtof(aValue.c_str(), nullptr), aOwn.mValue.real());
+        }
+        const std::string aTiff = fGdal("gdalinfo", {"-stats", aRaster.string() + ".tif"});
+        EXPECT_NE(aTiff.find("Driver: GTiff/"), std::string::npos) << aTiff;
+        const std::string aTiffSize = std::to_string(aOwn.mPixels / c.mTiffColumnWindow) + ", " + std::to_string(aOwn.mLines);
+        EXPECT_NE(aTiff.find("Size is " + aTiffSize), std::string::npos) << aTiff;
+        EXPECT_NE(aTiff.find("Type=Byte"), std::string::npos) << aTiff;
+        EXPECT_NE(aTiff.find("STATISTICS_MAXIMUM=255"), std::string::npos) << aTiff;
+    }
+}
+
+}  // namespace
