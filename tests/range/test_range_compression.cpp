@@ -204,6 +204,7 @@ TEST(RangeCompressionDriver, TargetsCompressAndFocusToTheirIdealResponsesOnEachS
     };
     const CCase aCases[] = {
         {"ERS-2, up-chirp, 5-bit codes around 15.5", aErs, true, 4, 1.5},
+        {"ERS-2, 8-bit codes around 127.5", aWith(aErs, {"--bits", "8"}), true, 4, 1.5},
         {"ERS-2, squinted beam", aWith(aErs, {"--doppler-centroid", "700"}), true, 4, 1.5},
         {"ENVISAT, 4-bit block-adaptive samples", {"--preset", "envisat", "--lines", "3072", "--samples", "1280", "--targets", "grid:2x2"},
          false, 4, 1.5},

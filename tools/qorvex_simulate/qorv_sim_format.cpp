@@ -12,16 +12,16 @@ namespace {
 constexpr double CQORV_SIM_BAQ_LEVELS[8] = {0.1284, 0.3881, 0.6568, 0.9424, 1.2562, 1.6180, 2.0690, 2.7326};
 constexpr double CQORV_SIM_BAQ_THRESHOLDS[7] = {0.2582, 0.5224, 0.7996, 1.0993, 1.4371, 1.8435, 2.4008};
 
-inline uint8_t code5(double theValue, double theGain, long& theClipped)
+inline uint8_t codeOf(double theValue, double theGain, double theMid, double theTop, long& theClipped)
 {
-    const double q = std::floor(theValue * theGain) + 16.0;
+    const double q = std::floor(theValue * theGain) + theMid;
     if (q < 0.0) {
         ++theClipped;
         return 0;
     }
-    if (q > 31.0) {
+    if (q > theTop) {
         ++theClipped;
-        return 31;
+        return static_cast<uint8_t>(theTop);
     }
     return static_cast<uint8_t>(q);
 }
@@ -38,12 +38,13 @@ inline float baq4(double theValue, double theRms, double theInverseRms, long& th
 
 }  // namespace
 
-long fqorvSimQuantise5Bit(const std::complex<double>* theIn, int n, double theGain, uint8_t* theOut)
+long fqorvSimQuantiseBytes(const std::complex<double>* theIn, int n, double theGain, int theBits, uint8_t* theOut)
 {
     long aClipped = 0;
+    const double aMid = static_cast<double>(1 << (theBits - 1)), aTop = static_cast<double>((1 << theBits) - 1);
     for (int i = 0; i < n; ++i) {
-        theOut[2 * i] = code5(theIn[i].real(), theGain, aClipped);
-        theOut[2 * i + 1] = code5(theIn[i].imag(), theGain, aClipped);
+        theOut[2 * i] = codeOf(theIn[i].real(), theGain, aMid, aTop, aClipped);
+        theOut[2 * i + 1] = codeOf(theIn[i].imag(), theGain, aMid, aTop, aClipped);
     }
     return aClipped;
 }

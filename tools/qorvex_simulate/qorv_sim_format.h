@@ -1,8 +1,9 @@
 // Raw sample formats and line prefixes of the simulated sensors.
 //
-// 5-bit samples (ERS, ALOS): each component x becomes the code q = floor(g x) + 16 clipped to
-// 0 .. 31, which stands for (q - 15.5) / g: a mid-rise quantiser without bias, 15.5 being the
-// offset that the chain's I/Q offset estimate removes.
+// Byte samples (ERS, ALOS), 5-bit by default: each component x becomes the code
+// q = floor(g x) + 2^(b-1) clipped to 0 .. 2^b - 1, which stands for (q - 2^(b-1) + 0.5) / g: a
+// mid-rise quantiser without bias, 15.5 (5 bits) or 127.5 (8 bits) being the offset that the
+// chain's I/Q offset estimate removes.
 // Block-adaptive 4-bit samples (ENVISAT, decoded): every block of 64 complex samples is scaled by
 // its own rms, each component quantised to the 16 Lloyd-Max levels of a unit Gaussian, and
 // written back as float level * rms ("FLOAT_COMPLEX", no offset).
@@ -13,9 +14,13 @@
 
 #include "qorv_sim_scene.h"
 
-/// Quantises n complex samples to 5-bit codes (I then Q per sample, 2 n bytes) with theGain codes
-/// per unit; returns the number of components that were clipped.
-long fqorvSimQuantise5Bit(const std::complex<double>* theIn, int n, double theGain, uint8_t* theOut);
+/// Quantises n complex samples to theBits-bit codes (5 to 8; I then Q per sample, 2 n bytes) with
+/// theGain codes per unit; returns the number of components that were clipped.
+long fqorvSimQuantiseBytes(const std::complex<double>* theIn, int n, double theGain, int theBits, uint8_t* theOut);
+inline long fqorvSimQuantise5Bit(const std::complex<double>* theIn, int n, double theGain, uint8_t* theOut)
+{
+    return fqorvSimQuantiseBytes(theIn, n, theGain, 5, theOut);
+}
 /// The value (in units of the input) that a 5-bit code stands for.
 inline double fqorvSimDecode5Bit(uint8_t theCode, double theGain) { return (theCode - 15.5) / theGain; }
 

@@ -120,6 +120,10 @@ const std::map<std::string, Handler>& valueOptions()
         {"--pattern-extent", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mRadar.mPatternExtent = toDouble(o, v); }},
         {"--rms-dn", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mRmsDn = toDouble(o, v); }},
         {"--gain", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mGain = toDouble(o, v); }},
+        {"--bits", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) {
+             s.mCodeBits = static_cast<int>(toDouble(o, v));
+             if (s.mCodeBits < 5 || s.mCodeBits > 8) throw std::runtime_error(o + " wants 5 to 8");
+         }},
         {"--counter-start", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mCounter0 = toLong(o, v, 0, 4000000000L); }},
         {"--header-offset", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mHeaderOffset = static_cast<int32_t>(toLong(o, v, 0, 1 << 30)); }},
         {"--threads", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mThreads = static_cast<int>(toLong(o, v, 1, 64)); }},
@@ -176,7 +180,8 @@ Targets and noise:
   --snr DB                 image SNR of a unit target (default 40 dB)
   --no-noise               no thermal noise
   --rms-dn X               rms of each 5-bit component in codes (default 4.5)
-  --gain G                 fixed 5-bit gain, codes per unit amplitude (instead of --rms-dn)
+  --gain G                 fixed gain, codes per unit amplitude (instead of --rms-dn)
+  --bits N                 bits of each byte-sample component, 5 (default) to 8 (ERS, ALOS)
   --seed N                 seed of all random draws (default 1)
 Faults (at pulse indices):
   --drop-lines a,b,..      pulses transmitted but not recorded (the line counter jumps)

@@ -136,7 +136,8 @@ struct CSimScene {
     // Noise and quantisation.
     bool mNoise = true;
     double mSnrDb = 40.0;                // image signal-to-noise ratio of a unit target
-    double mRmsDn = 4.5;                 // rms of each raw component in 5-bit codes
+    double mRmsDn = 4.5;                 // rms of each raw component in 5-bit codes (scaled to the code width)
+    int mCodeBits = 5;                   // bits of a byte sample's code (5 to 8)
     double mGain = 0.0;                  // codes per unit amplitude; 0: from mRmsDn
 
     uint64_t mSeed = 1;

@@ -202,10 +202,10 @@ CJson rasterJson(const CSimScene& s, const CSimTimeline& tl, const CSimRunFigure
     ras["header_offset"] = s.mHeaderOffset;
     const int aBytes = s.mFormat == CSimSampleFormat::Ubyte5Bit ? 2 : 8;
     ras["record_length"] = s.mPrefix.mSize + aBytes * s.mSamples;
-    ras["format"] = s.mFormat == CSimSampleFormat::Ubyte5Bit ? "5bit" : "baq4";
+    ras["format"] = s.mFormat == CSimSampleFormat::Ubyte5Bit ? std::to_string(s.mCodeBits) + "bit" : "baq4";
     if (s.mFormat == CSimSampleFormat::Ubyte5Bit) {
-        ras["offset_dn"] = 15.5;
-        ras["rms_dn"] = s.mRmsDn;
+        ras["offset_dn"] = (1 << (s.mCodeBits - 1)) - 0.5;
+        ras["rms_dn"] = s.mRmsDn * (1 << (s.mCodeBits - 5));
         ras["scale"] = f.mGain;
     } else {
         ras["baq_block"] = 64;

@@ -56,7 +56,7 @@ void generateBlock(const CSimScene& s, const CSimEchoGenerator& theGenerator, do
             theGenerator.addNoise(k, aLine.data());
             uint8_t* out = b.mBytes.data() + static_cast<std::size_t>(i) * b.mBytesPerLine;
             if (s.mFormat == CSimSampleFormat::Ubyte5Bit)
-                b.mClipped[i] = fqorvSimQuantise5Bit(aLine.data(), s.mSamples, theGain, out);
+                b.mClipped[i] = fqorvSimQuantiseBytes(aLine.data(), s.mSamples, theGain, s.mCodeBits, out);
             else
                 b.mClipped[i] = fqorvSimQuantiseBaq4Bit(aLine.data(), s.mSamples, reinterpret_cast<float*>(out));
         }
@@ -132,14 +132,16 @@ void streamRecords(const CSimScene& s, const CSimTimeline& tl, const CSimEchoGen
     theReport.mClippedFraction = static_cast<double>(aClipped) / (2.0 * s.mPulses * s.mSamples);
 }
 
-/// The 5-bit gain: codes per unit amplitude so that each component's rms is mRmsDn, the signal
+/// The byte-code gain: codes per unit amplitude so that each component's rms is mRmsDn 5-bit codes
+/// (the same fraction of the full scale for wider codes), the signal
 /// power estimated from noise-free echoes of 64 pulses spread over the scene.
 double quantiserGain(const CSimScene& s, const CSimEchoGenerator& g, double& theSignalPower)
 {
     theSignalPower = g.meanSignalPower(static_cast<int>(std::min<long>(64, s.mPulses)));
     if (s.mGain > 0.0) return s.mGain;
     const double aComponentPower = 0.5 * (theSignalPower + g.noiseVariance());
-    return aComponentPower > 0.0 ? s.mRmsDn / std::sqrt(aComponentPower) : 1.0;
+    const double aRms = s.mRmsDn * static_cast<double>(1 << (s.mCodeBits - 5));
+    return aComponentPower > 0.0 ? aRms / std::sqrt(aComponentPower) : 1.0;
 }
 
 void writeRasterWith(const CSimScene& s, const CSimTimeline& tl, const CSimEchoGenerator& g, const std::string& thePath,

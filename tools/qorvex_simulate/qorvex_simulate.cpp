@@ -76,7 +76,8 @@ int main(int argc, char** argv)
                     aScene.mRadar.mSensorName.c_str(), r.mPulses, r.mRecords, aScene.mSamples, r.mTargets,
                     r.mScatterers);
         if (aScene.mFormat == CSimSampleFormat::Ubyte5Bit)
-            std::printf("5-bit gain %.4f codes/unit, clipped %.4f%% of components\n", r.mGain, 100.0 * r.mClippedFraction);
+            std::printf("%d-bit gain %.4f codes/unit, clipped %.4f%% of components\n", aScene.mCodeBits, r.mGain,
+                        100.0 * r.mClippedFraction);
         else
             std::printf("4-bit BAQ, %.4f%% of components beyond the outermost level\n", 100.0 * r.mClippedFraction);
         std::printf("%.2f s (echoes %.2f s, %d threads)\n", r.mSeconds, r.mEchoSeconds, r.mThreads);
