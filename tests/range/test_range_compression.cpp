@@ -236,6 +236,37 @@ TEST(RangeCompressionDriver, LostRepeatedAndShiftedLinesKeepEveryEchoInPlace)
     qtest::expectIdealTargets(aBox, aBox.data() / "scene_slc", aBox.data() / "raw_truth.json", 4);
 }
 
+/// Removes the lines of the header file at theRoot that hold theTag.
+void fDropHeaderLines(const fs::path& theRoot, const std::string& theTag)
+{
+    std::string aOut;
+    for (const std::string& aLine : qtest::readLines(theRoot.string() + ".sml"))
+        if (aLine.find(theTag) == std::string::npos) aOut += aLine + "\n";
+    qtest::writeFile(theRoot.string() + ".sml", aOut);
+}
+
+TEST(RangeCompressionDriver, SceneCoordinatesMissingFromTheHeaderComeFromTheOrbit)
+{
+    qtest::DriverSandbox aBox;
+    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "1024", "--samples", "1024", "--targets", "grid:1x1",
+                                             "--write-doppler", "--quiet", "--out", (aBox.data() / "raw").string(), "--config",
+                                             aBox.etc().string()};
+    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+    const double aLat = CJson::parseFile((aBox.data() / "raw_truth.json").string())["scene_centre"]["lat"].number();
+    fDropHeaderLines(aBox.data() / "raw", "<LatNorthing>");
+    auto aArgs = qtest::DriverSandbox::defaultArguments(aBox.data() / "raw", aBox.data() / "scene_slc");
+    aArgs[15] = aArgs[17] = "OK";
+    const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 300);
+    const std::string aTrace = qtest::readFile(aBox.work() / "Process.trace");
+    EXPECT_NE(aTrace.find("Latitude Northing"), std::string::npos);
+    EXPECT_NE(aTrace.find("Mean altitude = "), std::string::npos);
+    ASSERT_TRUE(fs::exists(aBox.data() / "scene_rc")) << aRun.mStderr;
+    qtest::InProcessEnvironment aEnv;
+    auto h = CDescriptionHeader::makeFull();
+    ASSERT_TRUE(h->read((aBox.data() / "scene_rc_hdr").c_str(), true));
+    EXPECT_NEAR(h->getField("RegistrationCoordinates.LatNorthing").getDouble(), aLat, 0.05);
+}
+
 TEST(RangeCompressionDriver, ThePrefilterRoadDecimatesAndKeepsTheRangeResponse)
 {
     // Presumming by 2 from the parameter file: half the lines, each a filtered sum of 17 echoes
@@ -330,6 +361,13 @@ TEST(RangeCompressionDriver, BadInputEndsWithItsFailureAndNoProduct)
         {"a raw file shorter than its header says", [&](auto&) { fs::resize_file(aRaw, fs::file_size(aRaw) / 2); }, 4, ""},
         {"prefix bytes outside the record", [&](auto&) { fSetField(aRaw, "Processing.LineCounterFirstBytePos", 500); }, 4,
          "outside the record prefix"},
+        {"no scene coordinates and a single state vector", [&](auto&) {
+             fDropHeaderLines(aRaw, "<LatNorthing>");
+             fSetField(aRaw, "StateVectorData.nStateVectors", 1);
+         }, 7, "You need at least 2 state vectors!"},
+        {"a processing velocity of 0", [&](auto&) { fSetField(aRaw, "Processing.ProcessingVelocity", 0.0); }, 2, "Velocity"},
+        {"a processing velocity that is not a number", [&](auto&) { fSetField(aRaw, "Processing.ProcessingVelocity", NAN); }, 2,
+         "Velocity"},
     };
     for (const CCase& c : aCases) {
         SCOPED_TRACE(c.mName);
@@ -341,7 +379,7 @@ TEST(RangeCompressionDriver, BadInputEndsWithItsFailureAndNoProduct)
         const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aCaseArgs), {}, 300);
         EXPECT_EQ(aRun.mStatus, c.mStatus) << aRun.mStderr;
         EXPECT_NE(qtest::readFile(aBox.work() / "Process.trace").find(c.mWords), std::string::npos);
-        EXPECT_FALSE(fs::exists(aBox.data() / "scene_rc"));
+        if (c.mStatus != 2 || std::string(c.mWords) != "Velocity") EXPECT_FALSE(fs::exists(aBox.data() / "scene_rc"));
         EXPECT_FALSE(fs::exists(aBox.data() / "scene_slc"));
     }
 }
