@@ -1,8 +1,8 @@
 #!/usr/bin/env bash
 # Focuses a full ERS frame (28,000 lines x 5,616 samples, 300 targets) through the driver: parameters,
 # range compression and omega-k focusing (steps 0, 2 and 5), on one thread and on two. For each run
-# it prints the wall time, the peak memory, the time of each step, and the ratio of the wall time to
-# the FFT work of the same run (the range line transforms and the omega-k blocks, measured by
+# it prints the wall time, the peak memory, the time of each step, the ratio of the wall time to
+# the FFT work of the same run, the ratio of range compression to its own line transforms (the range line transforms and the omega-k blocks, measured by
 # bench_chain_fft right after it with the same thread count), then the point targets' worst figures.
 #
 #   bench/bench_chain.sh [build/bin]        (scratch files under $TMPDIR, about 3 GB, removed at the end)
@@ -42,6 +42,9 @@ for threads in 1 2; do
   sed -n 's/^DURATION \[\(.*\)\]  (s) = \(.*\)/   step "\1": \2 s/p' "$trace"
   echo "   FFT work alone: $fft"
   awk -v w="$wall" -v f="$fftsec" 'BEGIN { printf "   ratio of the wall time to the FFT work: %.2f\n", w / f }'
+  rcsec=$(sed -n 's/^DURATION \[ range compression\]  (s) = //p' "$trace")
+  rgsec=$(sed -n 's/^range transforms \([0-9.]*\) s.*/\1/p' <<< "$fft")
+  awk -v r="$rcsec" -v f="$rgsec" 'BEGIN { printf "   range compression against its own transforms: %.2f\n", r / f }'
 done
 
 echo "== point targets of the SLC against the simulator's truth (worst case)"
