@@ -1,4 +1,4 @@
-// Cell type and data unit tables.
+// Cell types: names, codes and sizes.
 #include <gtest/gtest.h>
 
 #include "qorv_cell_types.h"
@@ -33,19 +33,3 @@ TEST(CellTypes, UnknownCodeReportsOnTheTrace)
     EXPECT_NE(aEnv.trace().find("Error: unsupported raster file type 99"), std::string::npos);
 }
 
-TEST(DataUnits, TextsAndTheMissingCode)
-{
-    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_POWER), "POWER");
-    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_SLC), "SLC");
-    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_JERS1_RAW), "JERS 1 RAW");
-    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_SIRC_RAW), "SIR-C RAW");
-    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_REFLECTANCE), "REFLECTANCE");
-    EXPECT_STREQ(fqorvDataUnitsName(21), "WRONG UNITS");
-    EXPECT_STREQ(fqorvDataUnitsName(39), "WRONG UNITS");
-    for (int i = 0; i <= CQORV_DATA_UNITS_MAX; ++i)
-        if (i != 21) {
-            EXPECT_EQ(fqorvDataUnitsFromName(fqorvDataUnitsName(i)), i);
-        }
-    EXPECT_EQ(fqorvDataUnitsFromName("WRONG UNITS"), -1);
-    EXPECT_EQ(fqorvDataUnitsFromName("LOGARITMIC"), CQORV_UNITS_LOGARITMIC);
-}

@@ -113,27 +113,6 @@ TEST_F(RasterFileTest, ComplexCellsSwapComponentByComponent)
     EXPECT_EQ(aFile, aExpected);  // each 4-byte part reversed on its own, parts in place
 }
 
-TEST_F(RasterFileTest, ScaleFactorFlag)
-{
-    const std::string aName = path("scale");
-    writeBytes(aName, std::vector<uint8_t>(8, 0));
-    auto aFlag = [&](double theRe, double theIm) {
-        CRasterFileParam p = param(aName, 1, 1, CQORV_CELL_FLOAT_COMPLEX);
-        p.mRealScaleFactor = theRe;
-        p.mImaginaryScaleFactor = theIm;
-        CRasterFile f;
-        f.openRead(p);
-        const bool aSet = f.hasScaleFactor();
-        f.close();
-        return aSet;
-    };
-    EXPECT_FALSE(aFlag(1.0, 1.0));
-    EXPECT_TRUE(aFlag(2.0, 1.0));
-    EXPECT_TRUE(aFlag(1.0, NAN));
-    EXPECT_TRUE(aFlag(NAN, 1.0));
-    EXPECT_TRUE(aFlag(1.0, INFINITY));
-}
-
 // Reads clamp a start row outside the image to the nearest line; without prefix and suffix a read
 // from column 0 delivers whole records even for a short last column, with a prefix it packs.
 TEST_F(RasterFileTest, ClampingAndWholeRecordRoad)

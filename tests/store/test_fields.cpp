@@ -187,30 +187,3 @@ TEST(StoreUserKeys, SetReplaceAppendAndPrefixLookup)
     EXPECT_QORV_FAILURE(fqorvSetUserKey(aPar, "ORIGIN DATA", "x"), CQORV_ERR_UNKNOWN_KEY);
 }
 
-TEST(StorePrint, FieldLinesShowStructureTypeAndFirstValue)
-{
-    StoreEnv aEnv;
-    auto aHeader = storetest::makeTestHeader();
-    CDescriptionHeader& h = *aHeader;
-    h["StoreTest.IntScalar"].setValue(12);
-    h["StoreTest.StrMatrix"].resize(1, 2);
-    h["StoreTest.StrMatrix"].setValue(0, 0, "k");
-    h["StoreTest.Track"].resize(1, 1);
-    h.print(true);
-    h.getSection("StoreSecond")->print(false);
-    const std::string aTrace = aEnv.env().trace();
-    EXPECT_NE(aTrace.find("\n\n << Total number of Sections : 2 >>"), std::string::npos);
-    EXPECT_NE(aTrace.find("\n\n << [StoreTest]  -  Total number of Fields : 15 >>\n\n"), std::string::npos);
-    EXPECT_NE(aTrace.find("[IntScalar]  [SCALAR]  [Integer]  =  12\n"), std::string::npos);
-    EXPECT_NE(aTrace.find("[DblScalar]  [SCALAR]  [Double]: EMPTY\n"), std::string::npos);
-    EXPECT_NE(aTrace.find("[StrMatrix]  [MARTIX]  [String]  [Row Nbr : 1]  [Col Nbr : 2]  =  [k]\n"), std::string::npos);
-    EXPECT_NE(aTrace.find("[Track]  [MULTIPLE]  [Field Of Section pointer]  [Number of sub fiels : 2]\n"),
-              std::string::npos);
-    EXPECT_NE(aTrace.find("[TrackV]  [VECTOR]  [Double]  [Number of elements : 1]  =  0\n"), std::string::npos);
-    // print(false) leaves the empty fields out: "Note" stands once, from print(true).
-    const std::string aNote = "[Note]  [SCALAR]  [String]: EMPTY";
-    ASSERT_NE(aTrace.find(aNote), std::string::npos);
-    EXPECT_EQ(aTrace.find(aNote, aTrace.find(aNote) + 1), std::string::npos);
-    EXPECT_STREQ(fqorvStructureName(7), "WRONG");
-    EXPECT_STREQ(fqorvDataTypeName(-1), "WRONG");
-}
