@@ -1,5 +1,7 @@
 #include "qorv_line_continuity.h"
 
+#include <algorithm>
+#include <climits>
 #include <cmath>
 #include <cstdarg>
 #include <cstdlib>
@@ -24,7 +26,11 @@ namespace {
 bool fIsErs(int theSensor) { return theSensor == CSAR_SENSOR_ERS1_ID || theSensor == CSAR_SENSOR_ERS2_ID; }
 
 /// Rounds half away from zero.
-int32_t fRound(double x) { return static_cast<int32_t>(x >= 0.0 ? std::floor(x + 0.5) : -std::floor(-x + 0.5)); }
+int32_t fRound(double x)
+{
+    const double r = x >= 0.0 ? std::floor(x + 0.5) : -std::floor(-x + 0.5);
+    return static_cast<int32_t>(std::clamp(r, -2147483647.0, 2147483647.0));
+}
 
 }  // namespace
 
@@ -94,8 +100,11 @@ CContinuityDecision CLineContinuity::check(const uint8_t* thePrefix, CContinuity
     if (!isChecked(mLayout.mSensor) || mLayout.mCounterPos < 0) return aDecision;
     mLineCounter = fqorvBigEndian32(thePrefix + mLayout.mCounterPos);
     const bool aErsEnvisat = fIsErs(mLayout.mSensor) || mLayout.mSensor == CSAR_SENSOR_ENVISAT1_ID;
-    aDecision = aErsEnvisat ? checkErsEnvisat(theRoad, theLine, theRecord) : checkJersAlos(theLine);
+    // At priming the rows before the first record may stay empty: its row number is no test.
+    const int aLine = theRoad == CContinuityRoad::Priming && !mAccepted ? 0 : theLine;
+    aDecision = aErsEnvisat ? checkErsEnvisat(theRoad, aLine, theRecord) : checkJersAlos(aLine);
     if (aDecision.mDrop) return aDecision;
+    mAccepted = true;
     if (hasSlantRange(mLayout.mProduct)) {
         checkSlantRange(thePrefix, theLine);
     } else if (mLayout.mSwstPos >= 0) {
@@ -110,7 +119,8 @@ CContinuityDecision CLineContinuity::checkErsEnvisat(CContinuityRoad theRoad, in
 {
     CContinuityDecision aDecision;
     const bool aErs = fIsErs(mLayout.mSensor);
-    const int32_t aStep = mLineCounter - mLastLine;
+    const int64_t aWide = static_cast<int64_t>(mLineCounter) - mLastLine;
+    const int32_t aStep = static_cast<int32_t>(std::clamp<int64_t>(aWide, INT32_MIN, INT32_MAX));
     if (aStep > 1 && theLine != 0) {
         rememberGap(aStep, theLine);
         ++mGapEvents;
@@ -142,7 +152,8 @@ CContinuityDecision CLineContinuity::checkErsEnvisat(CContinuityRoad theRoad, in
 CContinuityDecision CLineContinuity::checkJersAlos(int theLine)
 {
     CContinuityDecision aDecision;
-    const int32_t aDifference = mLineCounter - mLastLine;
+    const int64_t aWide = static_cast<int64_t>(mLineCounter) - mLastLine;
+    const int32_t aDifference = static_cast<int32_t>(std::clamp<int64_t>(aWide, -INT32_MAX, INT32_MAX));
     const int32_t aStep = std::abs(aDifference);
     if (aStep != 1 && theLine != 0) {
         rememberGap(aStep, theLine);

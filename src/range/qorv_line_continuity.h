@@ -51,13 +51,14 @@ public:
     static bool hasSlantRange(int theProduct);
 
     /// Examines one record: its prefix, the loop's line (direct road and refill) or row number
-    /// (priming), and the record number for the traces.
+    /// (priming), and the record number for the traces. The first record of a run is never a gap:
+    /// on the direct road it is line 0, at priming the first record taken.
     CContinuityDecision check(const uint8_t* thePrefix, CContinuityRoad theRoad, int theLine, int theRecord);
 
     /// Samples by which the compressed line moves (positive: toward far range).
     int shift() const { return mShift; }
     int gapEvents() const { return mGapEvents; }
-    int lostLines() const { return mLostLines; }
+    long long lostLines() const { return mLostLines; }
     int largestGap() const { return mLargestGap; }
     int largestGapLine() const { return mLargestGapLine; }
 
@@ -79,9 +80,10 @@ private:
     int32_t mSwstStep = 0;
     int32_t mShift = 0;
     int32_t mGapEvents = 0;
-    int32_t mLostLines = 0;
+    int64_t mLostLines = 0;    // wider than the counters: a far jump repeats on every record
     int32_t mLargestGap = 0;
     int32_t mLargestGapLine = 0;
+    bool mAccepted = false;      // a record has been taken (the first one is never a gap)
     double mFirstRange = -1.0;   // SR0 of the slant-range products (m); negative until the first record
     double mLastRange = 0.0;     // the last slant range kept
 };

@@ -501,7 +501,7 @@ void fFinish(CLoopState& s, const CRangeCompressionRun& r)
     s.mIn.close();
     fqorvRenameProduct(r.mWriteName.c_str(), r.mOutput.c_str());
     fdfTrace("vtest_missing_line_found: %d\n", s.mContinuity.gapEvents());
-    fdfTrace("vtest_missing_line_found_total: %d\n", s.mContinuity.lostLines());
+    fdfTrace("vtest_missing_line_found_total: %lld\n", s.mContinuity.lostLines());
     if (s.mContinuity.largestGap() > 0)
         fdfTrace("largest line gap: %d at line %d\n", s.mContinuity.largestGap(), s.mContinuity.largestGapLine());
 }

@@ -291,6 +291,8 @@ TEST(RangeCompressionDriver, ThePrefilterRoadDecimatesAndKeepsTheRangeResponse)
     aArgs[14] = aArgs[15] = aArgs[17] = "OK";
     aBox.run(aBox.writeArguments(aArgs), {}, 600);  // step 5 may refuse the decimated lines; step 2 is measured
     ASSERT_TRUE(fs::exists(aBox.data() / "scene_rc"));
+    // The rows before the first record stay empty at priming: that is no gap in the counters.
+    EXPECT_EQ(qtest::readFile(aBox.work() / "Process.trace").find("missing line(s)"), std::string::npos);
     CJson aTruth = CJson::parseFile((aBox.data() / "raw_truth.json").string());
     // 1024 lines of 1280 - 352 samples: the 704 replica points are halved to fit half the line.
     EXPECT_EQ(fs::file_size(aBox.data() / "scene_rc"), 1024u * (1280u - 352u) * 8u);
@@ -379,7 +381,9 @@ TEST(RangeCompressionDriver, BadInputEndsWithItsFailureAndNoProduct)
         const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aCaseArgs), {}, 300);
         EXPECT_EQ(aRun.mStatus, c.mStatus) << aRun.mStderr;
         EXPECT_NE(qtest::readFile(aBox.work() / "Process.trace").find(c.mWords), std::string::npos);
-        if (c.mStatus != 2 || std::string(c.mWords) != "Velocity") EXPECT_FALSE(fs::exists(aBox.data() / "scene_rc"));
+        if (std::string(c.mWords) != "Velocity") {
+            EXPECT_FALSE(fs::exists(aBox.data() / "scene_rc"));
+        }
         EXPECT_FALSE(fs::exists(aBox.data() / "scene_slc"));
     }
 }
