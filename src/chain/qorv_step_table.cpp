@@ -7,6 +7,7 @@
 #include "qorv_errors.h"
 #include "qorv_generic_utility.h"
 #include "qorv_az_SLC.h"
+#include "qorv_azimuth_spectrum.h"
 #include "qorv_multi_SLC.h"
 #include "qorv_pre_rc.h"
 #include "qorv_proc_param.h"
@@ -29,13 +30,6 @@ void removeFile(const std::string& theName)
     std::remove(theName.c_str());
 }
 
-/// Azimuth spectrum: removes its argument 3, the spectrum file.
-int shutAzimuthSpectrum(int theArgc, char** theArgv)
-{
-    if (theArgc > 3) removeFile(theArgv[3]);
-    return 1;
-}
-
 /// Doppler ambiguity: removes the two look files named from its argument 1 with fqorvJoin,
 /// which gives the doubled underscore "__amb1_mli" behind the range compressed file's name.
 int shutDopplerAmbiguity(int theArgc, char** theArgv)
@@ -55,7 +49,7 @@ int fdfDefaultShut(int, char**) { return 1; }
 
 const CStepRow CQORV_STEP_TABLE[CQORV_STEP_NBR] = {
     {"Processing parameters construction", qorv_proc_param, fdfDefaultShut},
-    {"SAR IQ raw data azimuth spectrum", stepNotBuilt, shutAzimuthSpectrum},
+    {"SAR IQ raw data azimuth spectrum", qorv_azsp_IQ, qorv_azsp_IQ_shut},
     {"range compression", qorv_pre_rc, fdfDefaultShut},
     {"autofocus", stepNotBuilt, fdfDefaultShut},
     {"doppler ambiguity", stepNotBuilt, shutDopplerAmbiguity},

@@ -1,0 +1,88 @@
+// The Doppler centroid estimator on clutter of known spectrum: complex Gaussian noise filtered in
+// azimuth by a band centred on a chosen centroid, written as the raster of a simulated scene's
+// header. The table it writes must give the centroid back, modulo the PRF, anywhere in the band.
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <filesystem>
+#include <random>
+#include <vector>
+
+#include "qorv_description_section.h"
+#include "qorv_doppler_estimation.h"
+#include "qorv_raster_file.h"
+#include "qorv_read_write_info.h"
+#include "qorvex_test_support.h"
+#include "tools_raster_file_exp.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+
+constexpr int kLines = 1024, kSamples = 1024, kTaps = 16;
+
+/// Writes theRoot as FLOAT_COMPLEX clutter whose azimuth spectrum is a Hann band centred on
+/// theCentroid (Hz), into the header of a simulated scene.
+void fWriteClutter(const fs::path& theRoot, double theCentroid, double thePrf)
+{
+    auto h = CDescriptionHeader::makeFull();
+    ASSERT_TRUE(h->read((theRoot.string() + "_hdr").c_str(), true));
+    (*h)["RasterInfo.CellType"].setValue("FLOAT_COMPLEX");
+    (*h)["RasterInfo.RowPrefix"].setValue(0);
+    (*h)["RasterInfo.NrOfPixelsPerLine"].setValue(kSamples);
+    (*h)["RasterInfo.NrOfLinesPerImage"].setValue(kLines);
+    ASSERT_TRUE(h->write((theRoot.string() + "_hdr").c_str(), true, false));
+    CRasterFileParam p;
+    fqorvRasterParamFromHeader(*h, theRoot.c_str(), p);
+    CRasterFile f;
+    f.openWrite(CQORV_RF_OPEN_WRITE, p);
+
+    std::vector<std::complex<double>> aTaps(kTaps);
+    for (int k = 0; k < kTaps; ++k)
+        aTaps[k] = std::polar(0.5 - 0.5 * std::cos(2.0 * M_PI * (k + 0.5) / kTaps), 2.0 * M_PI * theCentroid * k / thePrf);
+    std::mt19937 aRandom(7);
+    std::normal_distribution<double> aGauss;
+    std::vector<std::vector<std::complex<double>>> aNoise(kTaps, std::vector<std::complex<double>>(kSamples));
+    std::vector<fcomplex> aLine(kSamples);
+    for (int l = 0; l < kLines + kTaps; ++l) {
+        std::vector<std::complex<double>>& aNew = aNoise[static_cast<std::size_t>(l % kTaps)];
+        for (auto& z : aNew) z = {aGauss(aRandom), aGauss(aRandom)};
+        if (l < kTaps) continue;
+        for (int s = 0; s < kSamples; ++s) {
+            std::complex<double> v;
+            for (int k = 0; k < kTaps; ++k) v += aTaps[k] * aNoise[static_cast<std::size_t>((l - k) % kTaps)][s];
+            aLine[s] = fcomplex(static_cast<float>(v.real()), static_cast<float>(v.imag()));
+        }
+        fqorvWriteLine(f, aLine.data(), l - kTaps);
+    }
+    f.close();
+}
+
+TEST(DopplerEstimation, TheTableGivesTheCentroidBackAcrossTheBand)
+{
+    qtest::DriverSandbox aBox;
+    const fs::path aRoot = aBox.data() / "clutter";
+    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "256", "--samples", "1024", "--targets", "grid:1x1",
+                                             "--quiet", "--out", aRoot.string(), "--config", aBox.etc().string()};
+    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+    qtest::InProcessEnvironment aEnv;
+    const double aPrf = [&] {
+        auto h = CDescriptionHeader::makeFull();
+        EXPECT_TRUE(h->read((aRoot.string() + "_hdr").c_str(), true));
+        return (*h)["ChannelInfo.PRF"].getDouble(0);
+    }();
+    for (const double aFraction : {-0.45, -0.2, 0.0, 0.17, 0.31, 0.45}) {
+        SCOPED_TRACE(aFraction);
+        fWriteClutter(aRoot, aFraction * aPrf, aPrf);
+        ASSERT_TRUE(fdfEstimateDoppler(aRoot.c_str(), 1, 0, 50, false));
+        YDF_SAR aSar;
+        read_image_info(aRoot.c_str(), aSar);
+        ASSERT_TRUE(aSar.mDopplerTableEstimated);
+        for (const double aLine : {200.0, 512.0, 800.0}) {
+            const double aError = std::remainder(aSar.getDopplerFromPixel(kSamples / 2, aLine, false, false) - aFraction * aPrf, aPrf);
+            EXPECT_LT(std::fabs(aError), 0.005 * aPrf) << "line " << aLine;
+        }
+    }
+}
+
+}  // namespace
