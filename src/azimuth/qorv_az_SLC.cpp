@@ -73,12 +73,6 @@ struct CAzSlcParam {
     }
 };
 
-bool fIsSet(const CDescriptionHeader& theHeader, const char* theKey)
-{
-    const CDescriptionField* aField = theHeader.findField(theKey);
-    return aField != nullptr && aField->isInitialised();
-}
-
 bool fIsNull(float x) { return !std::isnan(x) && std::fabs(x) <= CQORV_NULL_LIMIT; }
 
 void fProgress(int& thePercent, int theNewPercent)
@@ -122,7 +116,7 @@ void fFftSizes(const CDescriptionHeader& theInput, const CDescriptionHeader& the
         p.nazft = aFixedFft;
         while (static_cast<unsigned>(p.nazft) * static_cast<unsigned>(p.nrfft) > CQORV_MAX_BLOCK_SAMPLES) p.nazft -= 1024;
     }
-    if (aProduct == 24 && fIsSet(theInput, "ChannelInfo.Description")) {
+    if (aProduct == 24 && fqorvHasValue(theInput, "ChannelInfo.Description")) {
         const char* aPol = theInput["ChannelInfo.Description"].getString(0);
         p.mHalfPixelShift = std::strcmp(aPol, "VH") == 0 || std::strcmp(aPol, "VV") == 0;
     }
@@ -192,9 +186,9 @@ std::unique_ptr<CDescriptionHeader> fOutputHeader(const CDescriptionHeader& theI
     o["RasterInfo.DataUnits"].setValue("SLC");
     o["Processing.NAzimuthLooks"].setValue(thePar["sar_processing.AzPresumming"].getInteger() *
                                            thePar["sar_processing.AzSubaperture"].getInteger());
-    const char* aAngleKey = fIsSet(theInput, "ChannelInfo.IncidenceAngle") ? "ChannelInfo.IncidenceAngle"
+    const char* aAngleKey = fqorvHasValue(theInput, "ChannelInfo.IncidenceAngle") ? "ChannelInfo.IncidenceAngle"
                                                                            : "ChannelInfo.RangeLookAngle";
-    if (fIsSet(theInput, aAngleKey)) {
+    if (fqorvHasValue(theInput, aAngleKey)) {
         int aRangeLooks = 0, aAzimuthLooks = 0;
         double aRangeGround = 0.0, aAzimuthGround = 0.0;
         if (fqorvSuggestedLooks(p.mGeometry.mRangeSpacing, p.mGeometry.azimuthSpacing(), theInput[aAngleKey].getDouble(),

@@ -18,12 +18,6 @@ const double aTwoPi = 2.0 * M_PI;
 const double aDegToRad = M_PI / 180.0;
 const double aRadToDeg = 180.0 / M_PI;
 
-bool fIsSet(const CDescriptionHeader& theHeader, const char* theKey)
-{
-    const CDescriptionField* aField = theHeader.findField(theKey);
-    return aField != nullptr && aField->isInitialised();
-}
-
 /// The orbit block: spacing on the ground from the velocity and position at the middle state vector.
 void fOrbitSpacing(CSpaceborneGeometry& g)
 {
@@ -103,7 +97,7 @@ CGeometryInput fqorvReadGeometryInput(const CDescriptionHeader& theData, const C
     if (in.mStateVectorNbr != 0) {
         for (const char* aName : {"vel", "pos"}) {
             const std::string aKey = std::string("StateVectorData.") + aName + "_x";
-            if (!fIsSet(theData, aKey.c_str())) {
+            if (!fqorvHasValue(theData, aKey.c_str())) {
                 fdfTrace("Missing mandatory field %s in file %s\n", aName, theHeaderName.c_str());
                 QORV_FATAL(theVariant.mMissingOrbitFailure, aName);
             }
@@ -122,7 +116,7 @@ CGeometryInput fqorvReadGeometryInput(const CDescriptionHeader& theData, const C
     in.mCentreRange = theData["Processing.SlantRange"].getDouble(1);
     in.mFarRange = theData["Processing.SlantRange"].getDouble(2);
     in.mVelocity = thePar["sar_processing.Velocity"].getDouble();
-    if (theVariant.mUserVelocity && fIsSet(theData, "Processing.UserProcessingVelocity"))
+    if (theVariant.mUserVelocity && fqorvHasValue(theData, "Processing.UserProcessingVelocity"))
         in.mVelocity = theData["Processing.UserProcessingVelocity"].getDouble(0);
     if (in.mVelocity == 0.0 || std::isnan(in.mVelocity)) {
         fdfTrace("Error: processing velocity %f\n", in.mVelocity);
@@ -188,10 +182,10 @@ void fqorvWriteGeometryFields(const CSpaceborneGeometry& theGeometry, const CDes
     if (aVelocity.getNbrOfElements() < 1) aVelocity.resize(1, 1);
     aVelocity.setValue(0, theGeometry.mIn.mVelocity);
 
-    if (!fIsSet(theSource, "Processing.UserDopCenRangeCoeff")) return;
+    if (!fqorvHasValue(theSource, "Processing.UserDopCenRangeCoeff")) return;
     const double aUser = theSource["Processing.UserDopCenRangeCoeff"].getDouble(0, 0);
     CDescriptionField& aTable = theTarget["Processing.DopCenRangeCoeff"];
-    const bool aTableForm = fIsSet(theTarget, "Processing.DopplerEstimatedFlag") &&
+    const bool aTableForm = fqorvHasValue(theTarget, "Processing.DopplerEstimatedFlag") &&
                             std::strncmp(theTarget["Processing.DopplerEstimatedFlag"].getString(), "OK", 2) == 0;
     if (!aTable.isInitialised()) aTable.resize(1, aTableForm ? 3 : 1);
     for (int r = 0; r < aTable.getNbrOfRows(); ++r) aTable.setValue(r, aTableForm ? 2 : 0, aUser);

@@ -54,26 +54,20 @@ CTiffArguments readArguments(int argc, char** argv)
     return a;
 }
 
-bool hasValue(const CDescriptionHeader& h, const char* theKey)
-{
-    const CDescriptionField* f = h.findField(theKey);
-    return f != nullptr && f->isInitialised();
-}
-
 std::string textOr(const CDescriptionHeader& h, const char* theKey, const char* theDefault)
 {
-    return hasValue(h, theKey) ? h[theKey].getString() : theDefault;
+    return fqorvHasValue(h, theKey) ? h[theKey].getString() : theDefault;
 }
 
 double doubleOr(const CDescriptionHeader& h, const char* theKey, double theDefault)
 {
-    return hasValue(h, theKey) ? h[theKey].getDouble() : theDefault;
+    return fqorvHasValue(h, theKey) ? h[theKey].getDouble() : theDefault;
 }
 
 /// The GeoTIFF keys of a geocoded header's cartographic state.
 void setUpGeoKeys(GTIF* theGtif, const CDescriptionHeader& h)
 {
-    if (!hasValue(h, "CartographicSystem.State")) {
+    if (!fqorvHasValue(h, "CartographicSystem.State")) {
         fdfTrace("\nSetUpGeoKeys No State Spec");
         return;
     }
@@ -90,7 +84,7 @@ void setUpGeoKeys(GTIF* theGtif, const CDescriptionHeader& h)
         GTIFKeySet(theGtif, GeogEllipsoidGeoKey, TYPE_SHORT, 1, 7030);
         GTIFKeySet(theGtif, GeogPrimeMeridianGeoKey, TYPE_SHORT, 1, 8901);
     } else if (aState == "UTM-GLOBAL") {
-        const int aZone = hasValue(h, "CartographicSystem.Zone") ? h["CartographicSystem.Zone"].getInteger() : 0;
+        const int aZone = fqorvHasValue(h, "CartographicSystem.Zone") ? h["CartographicSystem.Zone"].getInteger() : 0;
         const std::string aHemi = textOr(h, "CartographicSystem.Hemisphere", "NORTH");
         const int aCode = (aHemi == "NORTH" ? 32600 : 32700) + aZone;
         const char* aLetter = aHemi == "NORTH" ? "N" : "S";
@@ -112,7 +106,7 @@ void setUpGeoKeys(GTIF* theGtif, const CDescriptionHeader& h)
         add("| Hemisphere = ", "CartographicSystem.Hemisphere");
         add("| Projection = ", "InitialGeometry.Projection");
         aText += "| Zone = ";
-        aText += hasValue(h, "CartographicSystem.Zone") ? std::to_string(h["CartographicSystem.Zone"].getInteger())
+        aText += fqorvHasValue(h, "CartographicSystem.Zone") ? std::to_string(h["CartographicSystem.Zone"].getInteger())
                                                         : std::string("UNKNOW Data");
         add("| Ellipsoid = ", "CartographicSystem.Ellipsoid");
         add("| DatumShift = ", "CartographicSystem.DatumShift");

@@ -61,12 +61,6 @@ struct CRangeCompressionRun {
     int circularRows() const { return D == 1 ? 1 : 2 * taps(); }
 };
 
-bool fIsSet(const CDescriptionHeader& theHeader, const char* theKey)
-{
-    const CDescriptionField* aField = theHeader.findField(theKey);
-    return aField != nullptr && aField->isInitialised();
-}
-
 std::unique_ptr<CDescriptionHeader> fReadHeader(const std::string& theName, const char* theWords,
                                                 std::unique_ptr<CDescriptionHeader> theHeader)
 {
@@ -95,7 +89,7 @@ void fUsage(const char* theProgram)
 void fSelectChannel(const CDescriptionHeader& theInput, const CDescriptionHeader& thePar, CRangeCompressionRun& r)
 {
     const CDescriptionField& aList = theInput["ChannelInfo.Description"];
-    const std::string aWanted = fIsSet(thePar, "sar_processing.Channel") ? thePar["sar_processing.Channel"].getString() : "";
+    const std::string aWanted = fqorvHasValue(thePar, "sar_processing.Channel") ? thePar["sar_processing.Channel"].getString() : "";
     const int aCount = aList.isInitialised() ? aList.getNbrOfElements() : 0;
     int aFound = -1;
     for (int c = 0; c < aCount; ++c)
@@ -118,14 +112,14 @@ void fContinuityLayout(CDescriptionHeader& theInput, CRangeCompressionRun& r)
     std::string aOrigin;
     l.mProduct = fqorvGetUserKey(theInput, "ORIGIN DATA", aOrigin) ? fqorvOrigProdStrToID(aOrigin.c_str()) : -1;
     CLineContinuity::defaultPositions(l.mSensor, l.mCounterPos, l.mSwstPos);
-    if (fIsSet(theInput, "Processing.LineCounterFirstBytePos")) {
+    if (fqorvHasValue(theInput, "Processing.LineCounterFirstBytePos")) {
         l.mCounterPos = theInput["Processing.LineCounterFirstBytePos"].getInteger();
         if (l.mCounterPos == 32) {
             l.mCounterPos = 54;
             theInput["Processing.LineCounterFirstBytePos"].setValue(54);
         }
     }
-    if (fIsSet(theInput, "Processing.SWSTFirstBytePos")) l.mSwstPos = theInput["Processing.SWSTFirstBytePos"].getInteger();
+    if (fqorvHasValue(theInput, "Processing.SWSTFirstBytePos")) l.mSwstPos = theInput["Processing.SWSTFirstBytePos"].getInteger();
     l.mPrefixBytes = r.mPrefixBytes;
     l.mPixelSpacing = r.mPixelSpacing;
     l.mRangeOut = r.aRangeOut;
@@ -160,8 +154,8 @@ void fSetUp(int argc, char** argv, CRangeCompressionRun& r, std::unique_ptr<CDes
     r.N = argc > 7 ? std::atoi(argv[7]) : par["sar_processing.RgFFT"].getInteger();
     if (r.N < 1024) r.N = 1024;
     if (r.D < 1) r.D = 1;
-    r.F = fIsSet(in, "sar_processing.FirstPixel")    ? in["sar_processing.FirstPixel"].getInteger()
-          : fIsSet(par, "sar_processing.FirstPixel") ? par["sar_processing.FirstPixel"].getInteger()
+    r.F = fqorvHasValue(in, "sar_processing.FirstPixel")    ? in["sar_processing.FirstPixel"].getInteger()
+          : fqorvHasValue(par, "sar_processing.FirstPixel") ? par["sar_processing.FirstPixel"].getInteger()
                                                      : 0;
     if (r.mFirstLine < 0) {
         fdfTrace("negative line offsets not permitted!\n");
@@ -171,7 +165,7 @@ void fSetUp(int argc, char** argv, CRangeCompressionRun& r, std::unique_ptr<CDes
         fdfTrace("Error: %d lines to compress with a decimation factor of %d\n", r.nl, r.D);
         QORV_FATAL(CQORV_ERR_WRONG_REQUEST, "sar_processing.ProcessedLines");
     }
-    if (fIsSet(par, "sar_processing.AzBandWidthFraction")) r.mBandFraction = par["sar_processing.AzBandWidthFraction"].getDouble();
+    if (fqorvHasValue(par, "sar_processing.AzBandWidthFraction")) r.mBandFraction = par["sar_processing.AzBandWidthFraction"].getDouble();
     fdfTrace("prefilter decimation factor:            %d\n", r.D);
     fdfTrace("offset #echoes for first line:          %d\n", r.mFirstLine);
     fdfTrace("number of lines to prefilter/compress:  %d\n", r.nl);
@@ -192,16 +186,16 @@ void fSetUp(int argc, char** argv, CRangeCompressionRun& r, std::unique_ptr<CDes
     r.mChirp.mPulseDuration = in["ChannelInfo.PulseDuration"].getDouble(c);
     r.mChirp.mBandwidth = in["ChannelInfo.BandWidth"].getDouble(c);
     r.mPrf = in["ChannelInfo.PRF"].getDouble(c);
-    r.mChirpText = fIsSet(in, "Sensor.Chirp") ? in["Sensor.Chirp"].getString() : "";
-    r.mSpectrumText = fIsSet(in, "Sensor.Spectrum") ? in["Sensor.Spectrum"].getString() : "";
+    r.mChirpText = fqorvHasValue(in, "Sensor.Chirp") ? in["Sensor.Chirp"].getString() : "";
+    r.mSpectrumText = fqorvHasValue(in, "Sensor.Spectrum") ? in["Sensor.Spectrum"].getString() : "";
     r.mChirp.mChirp = r.mChirpText.c_str();
     r.mChirp.mSpectrum = r.mSpectrumText.c_str();
-    r.mChirp.mBaseband = fIsSet(in, "Sensor.Baseband") && std::strcmp(in["Sensor.Baseband"].getString(), "YES") == 0;
+    r.mChirp.mBaseband = fqorvHasValue(in, "Sensor.Baseband") && std::strcmp(in["Sensor.Baseband"].getString(), "YES") == 0;
     if (!(r.mChirp.mSamplingRate > 0.0) || !(r.mChirp.mPulseDuration >= 0.0) || !(r.mPrf > 0.0)) {
         fdfTrace("Error: sampling rate %g, pulse duration %g, PRF %g\n", r.mChirp.mSamplingRate, r.mChirp.mPulseDuration, r.mPrf);
         QORV_FATAL(CQORV_ERR_WRONG_REQUEST, "ChannelInfo.SamplingRate");
     }
-    r.mSwstNullValue = fIsSet(in, "Processing.SWST_null_value_used") ? in["Processing.SWST_null_value_used"].getInteger() : 0;
+    r.mSwstNullValue = fqorvHasValue(in, "Processing.SWST_null_value_used") ? in["Processing.SWST_null_value_used"].getInteger() : 0;
     r.mPixelSpacing = CSAR_C / (r.mChirp.mSamplingRate * 2.0);
 
     r.aWidth = std::min(r.mLineLength - r.F, r.N);
@@ -277,8 +271,8 @@ std::unique_ptr<CDescriptionHeader> fOutputHeader(const CDescriptionHeader& theI
     const uint16_t aProbe = 1;
     o["RasterInfo.BytesOrder"].setValue(*reinterpret_cast<const uint8_t*>(&aProbe) == 1 ? "LSBF" : "MSBF");
 
-    const bool aLat = fIsSet(theInput, "RegistrationCoordinates.LatNorthing");
-    const bool aLon = fIsSet(theInput, "RegistrationCoordinates.LonEasting");
+    const bool aLat = fqorvHasValue(theInput, "RegistrationCoordinates.LatNorthing");
+    const bool aLon = fqorvHasValue(theInput, "RegistrationCoordinates.LonEasting");
     if (!aLat) QORV_WARNING(CQORV_WARN_COORDINATES, "Latitude Northing");
     if (!aLon) QORV_WARNING(CQORV_WARN_COORDINATES, "Longitude Easting");
     if (!aLat || !aLon) {
@@ -517,7 +511,7 @@ int qorv_pre_rc(int argc, char** argv)
     }
     std::unique_ptr<CDescriptionHeader> aInput =
         fReadHeader(std::string(argv[1]) + "_hdr", "Error: missing parameter file ", CDescriptionHeader::makeFull());
-    if (fIsSet(*aInput, "Processing.UserSkipRangeCompression")) {
+    if (fqorvHasValue(*aInput, "Processing.UserSkipRangeCompression")) {
         fdfTrace("range compression skipped by the user\n");
         return 0;
     }
@@ -539,14 +533,14 @@ int qorv_pre_rc(int argc, char** argv)
     if (r.D != 1) {
         for (const char* aKey : {"Processing.DopCenRangeCoeff", "sar_processing.AzBandWidthFraction"}) {
             const CDescriptionHeader& h = std::strncmp(aKey, "sar_", 4) == 0 ? *aPar : *aInput;
-            if (!fIsSet(h, aKey)) {
+            if (!fqorvHasValue(h, aKey)) {
                 fdfTrace("Missing mandatory field %s in file %s\n", aKey, std::strncmp(aKey, "sar_", 4) == 0 ? r.mParFile.c_str() : r.mInput.c_str());
                 QORV_FATAL(CQORV_ERR_MANDATORY, aKey);
             }
         }
         // The constant term of row 0 in the form at hand: column 2 of the estimator's table.
         const CDescriptionField& aDoppler = (*aInput)["Processing.DopCenRangeCoeff"];
-        const bool aTable = fIsSet(*aInput, "Processing.DopplerEstimatedFlag") &&
+        const bool aTable = fqorvHasValue(*aInput, "Processing.DopplerEstimatedFlag") &&
                             std::strcmp((*aInput)["Processing.DopplerEstimatedFlag"].getString(), "OK") == 0;
         r.mCentroid = aTable ? aDoppler.getDouble(0, 2) : aDoppler.getDouble(0, 0);
         const std::string aListingName = r.mOutput + "prefiller.dat";

@@ -683,3 +683,9 @@ void fqorvSetUserKey(CDescriptionHeader& theHeader, const char* theKey, const ch
     aInfo.setValue(aOldRows, 0, aKey);
     aInfo.setValue(aOldRows, 1, theValue);
 }
+
+bool fqorvHasValue(const CDescriptionHeader& theHeader, const char* theKey)
+{
+    const CDescriptionField* aField = theHeader.findField(theKey);
+    return aField != nullptr && aField->isInitialised();
+}

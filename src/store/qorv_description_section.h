@@ -223,6 +223,9 @@ public:
     std::string mRootTag = "HEADER_INFO";
 };
 
+/// True when the header has the field theKey and it holds a value: what "present" means for a field.
+bool fqorvHasValue(const CDescriptionHeader& theHeader, const char* theKey);
+
 /// User keys of "RasterInfo.OtherInfo", a string matrix of {key, value} rows.
 /// Lookup scans the rows in order and compares over the length of the key; false when no row
 /// matches or the header has no such field.
