@@ -347,7 +347,7 @@ CIqOffsets fIqOffsets(const CDescriptionHeader& theInput, CLoopState& s, const C
 void fReadRecord(CLoopState& s, const CRangeCompressionRun& r, int theRow, fcomplex* theBuffer)
 {
     fqorvReadLine(s.mIn, theBuffer, theRow, r.F, r.aLastColumn);
-    if (!s.mPrefix.empty()) s.mIn.readRowPrefix(theRow, s.mPrefix.data());
+    if (!s.mPrefix.empty()) std::memcpy(s.mPrefix.data(), s.mIn.lastRecordPrefix(), s.mPrefix.size());
 }
 
 /// Compresses the work line, applies the shift and writes aRangeOut samples as theLine.

@@ -116,6 +116,9 @@ public:
 
     /// Raw bytes of the row prefix of a line, as in the file (no swap).
     void readRowPrefix(int theLine, void* theBuffer);
+    /// The prefix bytes (as in the file) of the last record read by readLines when the records
+    /// have a prefix: a line and its prefix in one read, without seeking back. Null otherwise.
+    const uint8_t* lastRecordPrefix() const { return mRowPrefix > 0 && !mWorkBuffer.empty() ? mWorkBuffer.data() : nullptr; }
     /// Sets the prefix bytes that the following per-line writes carry (mRowPrefix bytes).
     void setRowPrefix(const void* theBytes);
 
