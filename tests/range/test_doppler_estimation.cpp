@@ -1,6 +1,6 @@
-// The Doppler centroid estimator on clutter of known spectrum: complex Gaussian noise filtered in
-// azimuth by a band centred on a chosen centroid, written as the raster of a simulated scene's
-// header. The table it writes must give the centroid back, modulo the PRF, anywhere in the band.
+// The Doppler centroid estimator on clutter of known spectrum (complex Gaussian noise filtered in
+// azimuth by a band centred on a chosen centroid): the table must give the centroid back, modulo
+// the PRF, anywhere in the band. Then step 1 through the driver on a simulated ERS scene.
 #include <gtest/gtest.h>
 
 #include <cmath>
@@ -10,6 +10,7 @@
 
 #include "qorv_description_section.h"
 #include "qorv_doppler_estimation.h"
+#include "qorv_json.h"
 #include "qorv_raster_file.h"
 #include "qorv_read_write_info.h"
 #include "qorvex_test_support.h"
@@ -83,6 +84,33 @@ TEST(DopplerEstimation, TheTableGivesTheCentroidBackAcrossTheBand)
             EXPECT_LT(std::fabs(aError), 0.005 * aPrf) << "line " << aLine;
         }
     }
+}
+
+TEST(DopplerEstimation, StepOneFindsTheCentroidOfASimulatedErsScene)
+{
+    // Clutter beyond both ends of the image, so that the first and last lines see scatterers on
+    // both sides of the beam, as a cut from a longer pass does.
+    qtest::DriverSandbox aBox;
+    const fs::path aRaw = aBox.data() / "scene_raw";
+    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "4096", "--samples", "1024", "--targets", "grid:2x2",
+                                             "--scatterers", "6000", "--scatterer-rms", "0.5", "--scatterer-margin", "1300",
+                                             "--quiet", "--out", aRaw.string(), "--config", aBox.etc().string()};
+    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+    auto aArgs = qtest::DriverSandbox::defaultArguments(aRaw, aBox.data() / "scene_slc");
+    aArgs[17] = "OK";  // no autofocus: steps 0, 1, 2 and 5
+    const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 600);
+    ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr << qtest::readFile(aBox.workingFile());
+    EXPECT_TRUE(fs::exists(aBox.data() / "scene_slc"));
+    EXPECT_FALSE(fs::exists(aBox.data() / "scene_azsp"));
+
+    const CJson aTruth = CJson::parseFile(aRaw.string() + "_truth.json");
+    const double aPrf = aTruth["radar"]["prf"].number(), aCentroid = aTruth["doppler"]["centroid"].number();
+    qtest::InProcessEnvironment aEnv;
+    YDF_SAR aSar;
+    read_image_info(aRaw.c_str(), aSar);
+    ASSERT_TRUE(aSar.mDopplerTableEstimated);
+    for (const double aLine : {1024.0, 2048.0, 3072.0})
+        EXPECT_LT(std::fabs(aSar.getDopplerFromPixel(512, aLine, false, false) - aCentroid), 0.005 * aPrf) << "line " << aLine;
 }
 
 }  // namespace

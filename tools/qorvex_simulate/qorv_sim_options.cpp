@@ -96,6 +96,7 @@ const std::map<std::string, Handler>& valueOptions()
          }},
         {"--scatterers", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mScatterers = toLong(o, v, 0, 10000000); }},
         {"--scatterer-rms", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mScattererRms = toDouble(o, v); }},
+        {"--scatterer-margin", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mScattererMargin = toLong(o, v, 0, 1000000); }},
         {"--seed", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mSeed = static_cast<uint64_t>(toLong(o, v, 0, 2147483647)); }},
         {"--drop-lines", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) {
              for (const std::string& p : split(v, ',')) s.mFaults.mDroppedPulses.push_back(toLong(o, p, 0, 899999));
@@ -177,6 +178,8 @@ Targets and noise:
   --targets FILE           JSON array of {id, amplitude, phase_deg, ecef:[x,y,z] | lat, lon, h | line, pixel, h}
   --scatterers N           N random point scatterers over the image, complex Gaussian reflectivity
   --scatterer-rms A        their rms amplitude (default 0.1; targets have amplitude 1)
+  --scatterer-margin N     the scatterer field runs N lines beyond each end of the image (default 0),
+                           so that the beam sees clutter on both sides at the first and last lines
   --snr DB                 image SNR of a unit target (default 40 dB)
   --no-noise               no thermal noise
   --rms-dn X               rms of each 5-bit component in codes (default 4.5)

@@ -309,7 +309,8 @@ void placeGrid(CSimScene& s, const CSimGeometry& g, const CSimTimeline& theTimel
         }
 }
 
-/// Random scatterers spread uniformly over the focused image, complex Gaussian reflectivity.
+/// Random scatterers spread uniformly over the focused image and mScattererMargin lines beyond each
+/// of its ends, complex Gaussian reflectivity.
 void placeScatterers(CSimScene& s, const CSimGeometry& g, const CSimTimeline& theTimeline)
 {
     const int aWidth = s.mSamples - fqorvSimReplicaPoints(s.mRadar);
@@ -323,7 +324,7 @@ void placeScatterers(CSimScene& s, const CSimGeometry& g, const CSimTimeline& th
         aRandom.gaussianPair(a, b);
         t.mAmplitude = s.mScattererRms * std::sqrt(0.5 * (a * a + b * b));
         t.mPhaseDeg = std::atan2(b, a) / CQORV_SIM_DEG;
-        const double aLine = aRandom.uniform() * (s.mPulses - 1);
+        const double aLine = aRandom.uniform() * (s.mPulses - 1 + 2.0 * s.mScattererMargin) - s.mScattererMargin;
         const double aPixel = aRandom.uniform() * (aWidth - 1);
         t.mEcef = g.locate(theTimeline.timeOfPulse(aLine), aNear + aPixel * s.mRadar.rangeSpacing(), s.mCentreHeight,
                            s.mLookSign, s.mEllipsoid);
@@ -461,6 +462,7 @@ void fqorvSimApplySceneJson(CSimScene& s, const CJson& j)
     if (const CJson* c = member(j, "scatterers")) {
         s.mScatterers = static_cast<long>(num(*c, "count", static_cast<double>(s.mScatterers)));
         s.mScattererRms = num(*c, "rms", s.mScattererRms);
+        s.mScattererMargin = static_cast<long>(num(*c, "margin_lines", static_cast<double>(s.mScattererMargin)));
     }
     if (j.has("targets") && j["targets"].isArray()) {
         s.mTargets.clear();

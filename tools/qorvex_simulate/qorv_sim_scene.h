@@ -132,6 +132,7 @@ struct CSimScene {
     CSimGridRequest mGrid{3, 3};         // used when no target is given
     long mScatterers = 0;
     double mScattererRms = 0.1;          // rms reflectivity amplitude of a scatterer
+    long mScattererMargin = 0;           // lines of the scatterer field beyond each end of the image
 
     // Noise and quantisation.
     bool mNoise = true;

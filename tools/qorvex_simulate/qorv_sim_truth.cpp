@@ -367,6 +367,7 @@ CJson fqorvSimTruthJson(const CSimScene& s, const CSimSceneTruth& t, const CSimT
     CJson& cl = j["scatterers"] = CJson::object();
     cl["count"] = s.mScatterers;
     cl["rms"] = s.mScattererRms;
+    cl["margin_lines"] = s.mScattererMargin;
 
     CJson aTargets = CJson::array();
     for (const CSimTargetTruth& tt : t.mTargets) aTargets.push(targetJson(s, tt));
