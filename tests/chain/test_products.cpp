@@ -25,10 +25,12 @@ std::string fGdal(const char* theProgram, const std::vector<std::string>& theArg
     return r.mStdout;
 }
 
-/// Width, lines and one pixel (line, pixel) of a raster of the chain, read with the project's code.
+/// Width, lines, one pixel (line, pixel) and the mean power of a raster of the chain, read with
+/// the project's code.
 struct CRasterSample {
     int mPixels = 0, mLines = 0;
     fcomplex mValue;
+    double mMeanPower = 0.0;
 };
 
 CRasterSample fReadOwn(const fs::path& theRaster, int theLine, int thePixel)
@@ -41,8 +43,14 @@ CRasterSample fReadOwn(const fs::path& theRaster, int theLine, int thePixel)
     CRasterFile f;
     f.openRead(p);
     std::vector<fcomplex> aLine(static_cast<std::size_t>(p.mNrOfPixelsPerLine));
-    fqorvReadLine(f, aLine.data(), theLine);
-    return {p.mNrOfPixelsPerLine, p.mNrOfLinesPerImage, aLine[static_cast<std::size_t>(thePixel)]};
+    CRasterSample r{p.mNrOfPixelsPerLine, p.mNrOfLinesPerImage, {}, 0.0};
+    for (int l = 0; l < r.mLines; ++l) {
+        fqorvReadLine(f, aLine.data(), l);
+        for (const fcomplex& z : aLine) r.mMeanPower += std::norm(z);
+        if (l == theLine) r.mValue = aLine[static_cast<std::size_t>(thePixel)];
+    }
+    r.mMeanPower /= static_cast<double>(r.mLines) * r.mPixels;
+    return r;
 }
 
 TEST(ChainProducts, GdalReadsEveryProductAsTheChainWroteIt)
@@ -80,6 +88,10 @@ TEST(ChainProducts, GdalReadsEveryProductAsTheChainWroteIt)
         EXPECT_NE(aInfo.find("Type=" + std::string(c.mType)), std::string::npos) << aInfo;
         const std::string aValue = fGdal("gdallocationinfo", {"-valonly", aRaster.string(), "300", "200"});
         if (c.mType[0] == 'C') {
+            // Normalised to a mean amplitude of sqrt(16000) in the central window: for a
+            // speckle-like image the mean power is 4 / pi of its square.
+            EXPECT_GT(aOwn.mMeanPower, 0.8 * 16000.0);
+            EXPECT_LT(aOwn.mMeanPower, 1.6 * 16000.0);
             float aRe = 0.0f, aIm = 0.0f;
             ASSERT_EQ(std::sscanf(aValue.c_str(), "%f%f", &aRe, &aIm), 2) << aValue;
             EXPECT_FLOAT_EQ(aRe, aOwn.mValue.real());
