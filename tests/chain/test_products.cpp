@@ -1,6 +1,7 @@
 // The chain's products read by an outside client: a simulated ERS scene through steps 0, 2, 5, 6
 // and 7, then step 8 on the SLC; GDAL opens the SLC and the power image through their ENVI headers
-// and both TIFFs, and its sizes, types and pixel values agree with what the chain wrote.
+// and both TIFFs, and its sizes, types and pixel values agree with what the chain wrote. Then the
+// operator's stop in each long step.
 #include <gtest/gtest.h>
 
 #include <cmath>
@@ -9,7 +10,11 @@
 #include <string>
 #include <vector>
 
+#include "qorv_az_SLC.h"
 #include "qorv_description_section.h"
+#include "qorv_enviroment.h"
+#include "qorv_multi_SLC.h"
+#include "qorv_pre_rc.h"
 #include "qorv_raster_file.h"
 #include "qorvex_test_support.h"
 #include "tools_raster_file_exp.h"
@@ -105,6 +110,37 @@ TEST(ChainProducts, GdalReadsEveryProductAsTheChainWroteIt)
         EXPECT_NE(aTiff.find("Size is " + aTiffSize), std::string::npos) << aTiff;
         EXPECT_NE(aTiff.find("Type=Byte"), std::string::npos) << aTiff;
         EXPECT_NE(aTiff.find("STATISTICS_MAXIMUM=255"), std::string::npos) << aTiff;
+    }
+}
+
+TEST(ChainProducts, TheOperatorsStopEndsEachLongStepWithoutAProduct)
+{
+    qtest::DriverSandbox aBox;
+    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "2048", "--samples", "1024", "--targets", "grid:1x1",
+                                             "--write-doppler", "--quiet", "--out", (aBox.data() / "scene_raw").string(),
+                                             "--config", aBox.etc().string()};
+    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+    auto aArgs = qtest::DriverSandbox::defaultArguments(aBox.data() / "scene_raw", aBox.data() / "scene_slc");
+    aArgs[5] = "OK";
+    aArgs[15] = aArgs[17] = "OK";
+    ASSERT_EQ(aBox.run(aBox.writeArguments(aArgs), {}, 600).mStatus, 0);
+
+    const std::string d = aBox.data().string() + "/";
+    const std::vector<std::vector<std::string>> aSteps = {
+        {"range compression", d + "scene_raw", d + "stop_rc", d + "scene_par"},
+        {"SAR azimuth omega/k processor", d + "scene_rc", d + "stop_slc", d + "scene_par", "1", "1", "8192", "0", "0"},
+        {"multi look", d + "scene_slc", d + "stop_pwr", d + "scene_par", "1", "5", "0", "NotOK", "NotOK", "NotOK"}};
+    const std::vector<int (*)(int, char**)> aRun = {qorv_pre_rc, qorv_az_SLC, qorv_multi_SLC};
+    for (std::size_t k = 0; k < aSteps.size(); ++k) {
+        SCOPED_TRACE(aSteps[k][0]);
+        qtest::InProcessEnvironment aEnv;
+        qtest::writeFile(gWorkingFile, "101\nstop\n");
+        std::vector<std::string> a = aSteps[k];
+        std::vector<char*> aArgv;
+        for (std::string& x : a) aArgv.push_back(x.data());
+        EXPECT_QORV_FAILURE(aRun[k](static_cast<int>(aArgv.size()), aArgv.data()), 326400);
+        EXPECT_FALSE(fs::exists(a[2]));
+        EXPECT_FALSE(fs::exists(a[2] + ".sml"));
     }
 }
 
