@@ -19,7 +19,6 @@
 #include "qorv_description_section.h"
 #include "qorv_enviroment.h"
 #include "qorv_errors.h"
-#include "qorv_fir.h"
 #include "qorv_generic_utility.h"
 #include "qorv_geometry_setup.h"
 #include "qorv_identifiers.h"
@@ -29,6 +28,7 @@
 #include "qorv_progress.h"
 #include "qorv_raster_file.h"
 #include "qorv_read_write_info.h"
+#include "qorv_subaperture_filter.h"
 #include "tools_raster_file_exp.h"
 #include "qorv_raster_utility.h"
 
@@ -310,10 +310,10 @@ void fReadRow(CRasterFile& theIn, const CAzSlcParam& p, int theLine, std::vector
     std::fill(theRow + aCount, theRow + p.nrfft, fcomplex(0.0f, 0.0f));
 }
 
-/// The azimuth band-pass FIR of the subapertures and its circular buffer of nfir input lines.
-class CSubapertureFilter {
+/// The coefficient listing "subaper.dat" of the subaperture road.
+class CSubaperListing {
 public:
-    CSubapertureFilter(const CAzSlcParam& p) : mNfir(8 * p.ndec + 1), mBuffer(mNfir, p.nrfft), mCoef(2 * mNfir - 1)
+    explicit CSubaperListing(const CAzSlcParam& p)
     {
         const std::string aName = p.mOutput + "subaper.dat";
         mFile = std::fopen(aName.c_str(), "w");
@@ -321,62 +321,19 @@ public:
             fdfTrace("cannot open subaperture filter coefficient data file: subaper.dat\n");
             QORV_FATAL(CQORV_ERR_CREATE_FILE, aName.c_str());
         }
-        std::fprintf(mFile, "%4d %4d\n", p.nsub(), mNfir);
+        std::fprintf(mFile, "%4d %4d\n", p.nsub(), 8 * p.ndec + 1);
         fdfTrace("subaperture filter circular buffer size (bytes): %zu\n",
-                 static_cast<std::size_t>(mNfir) * p.nrfft * sizeof(fcomplex));
+                 static_cast<std::size_t>(8 * p.ndec + 1) * p.nrfft * sizeof(fcomplex));
     }
-    ~CSubapertureFilter() { close(); }
+    ~CSubaperListing() { close(); }
     void close()
     {
         if (mFile) std::fclose(mFile);
         mFile = nullptr;
     }
-
-    /// Filters and decimates the block's lines from theOffset on into the block rows.
-    void fill(CRasterFile& theIn, const CAzSlcParam& p, int theOffset, double theWs1, CQorvMatrix<fcomplex>& theBlock,
-              std::vector<fcomplex>& theLineBuffer)
-    {
-        const std::vector<CFirTap> aTaps = fqorvDesignBandPassFir(mNfir, p.mGeometry.mFilterBandwidthRad, theWs1);
-        for (int t = 0; t < mNfir; ++t) {
-            mCoef[t] = fcomplex(aTaps[t].mValue);
-            std::fprintf(mFile, "%4d  %12.5le  %12.5le\n", t, aTaps[t].mValue.real(), aTaps[t].mValue.imag());
-        }
-        for (int t = 0; t < mNfir - 1; ++t) mCoef[t + mNfir] = mCoef[t];  // any nfir entries are a rotation
-        std::fflush(mFile);
-
-        const int half = mNfir / 2;
-        std::fill(mBuffer.data(), mBuffer.data() + mBuffer.nRows() * mBuffer.nCols(), fcomplex(0.0f, 0.0f));
-        for (int k = 0; k <= half - p.ndec; ++k)
-            if (theOffset + k >= 0 && theOffset + k < p.mLines) fReadRow(theIn, p, theOffset + k, theLineBuffer, mBuffer[half + k]);
-        int w = mNfir - p.ndec - 1;
-        int l = theOffset + half - p.ndec;
-        int o = 0;
-        for (; o < p.nazft && l < p.mLines - p.ndec; ++o) {
-            for (int d = 0; d < p.ndec; ++d) {
-                w = (w + 1) % mNfir;
-                ++l;
-                if (l >= 0) fReadRow(theIn, p, l, theLineBuffer, mBuffer[w]);
-                else std::fill(mBuffer[w], mBuffer[w] + p.nrfft, fcomplex(0.0f, 0.0f));
-                if (l % 1024 == 0) fdfTrace("range line: %d\n", l);
-            }
-            fcomplex* aOut = theBlock[o];
-            std::fill(aOut, aOut + p.nrfft, fcomplex(0.0f, 0.0f));
-            for (int t = 0; t < mNfir; ++t) {
-                const fcomplex aTap = mCoef[(mNfir - 1 - w) + t];
-                const fcomplex* aIn = mBuffer[t];
-                for (int n = 0; n < p.nrfft; ++n) aOut[n] += aTap * aIn[n];
-            }
-        }
-        if (o < p.nazft) {
-            fdfTrace("Warning: insufficient #prefilter lines for az. FFT size: %d\n", o);
-            for (int r = o; r < p.nazft; ++r) std::fill(theBlock[r], theBlock[r] + p.nrfft, fcomplex(0.0f, 0.0f));
-        }
-    }
+    std::FILE* file() const { return mFile; }
 
 private:
-    int mNfir;
-    CQorvMatrix<fcomplex> mBuffer;
-    std::vector<fcomplex> mCoef;
     std::FILE* mFile = nullptr;
 };
 
@@ -457,7 +414,8 @@ void fProcessSubaperture(YDF_SAR& theSar, CRasterFile& theIn, CRasterFile& theOu
         if (aCount < p.nazft) fdfTrace("Warning: insufficient #prefilter lines for az. FFT size: %d\n", aCount);
         if (p.mWidth > p.nrfft) fdfTrace("Warning: insufficient lines for rg. FFT size: %d\n", p.mWidth);
     } else {
-        theFilter->fill(theIn, p, theOffset, ws1, aBlock, st.mLine);
+        const QorvLineReader aRead = [&](int theLine, fcomplex* theRow) { fReadRow(theIn, p, theLine, st.mLine, theRow); };
+        theFilter->fill(aRead, p.mLines, theOffset, p.mGeometry.mFilterBandwidthRad, ws1, aBlock);
     }
 
     // Step 9: the Doppler bin keeps the centroid above; the tables take the one at the final block centre.
@@ -502,8 +460,12 @@ void fProcessBlocks(YDF_SAR& theSar, CRasterFile& theIn, CRasterFile& theOut, CA
     fqorvFftSetThreads(aThreads);
     COmegaKBlockFocuser aFocuser(aKernel, aThreads);
     fdfTrace("SAR data buffer size (bytes): %zu\n", static_cast<std::size_t>(p.nazft) * p.nrfft * sizeof(fcomplex));
+    std::unique_ptr<CSubaperListing> aListing;
     std::unique_ptr<CSubapertureFilter> aFilter;
-    if (p.nsub() > 1) aFilter = std::make_unique<CSubapertureFilter>(p);
+    if (p.nsub() > 1) {
+        aListing = std::make_unique<CSubaperListing>(p);
+        aFilter = std::make_unique<CSubapertureFilter>(p.ndec, p.nrfft, aListing->file());
+    }
 
     const long long aTotal = static_cast<long long>(p.az_line) * p.ndec;
     for (int i = 0; i < p.nsub(); ++i) st.mLastWritten[i] = i * p.az_line;
@@ -530,7 +492,7 @@ void fProcessBlocks(YDF_SAR& theSar, CRasterFile& theIn, CRasterFile& theOut, CA
         }
         st.block = aNext;
     }
-    if (aFilter) aFilter->close();
+    if (aListing) aListing->close();
 }
 
 /// Step 14: header, normalisation, final name.
