@@ -3,6 +3,7 @@
 // weights, and returned to the image domain. Plans, block and per-bin tables are made once.
 #pragma once
 
+#include <algorithm>
 #include <vector>
 
 #include "qorv_complex.h"
@@ -40,6 +41,9 @@ public:
     /// Per-bin tables for a block: Doppler centroid theCentroid (Hz) with its bin theDopplerBin, and
     /// the centring shift theShift (lines). Fills kx, kx2, az and the Kaiser 2.12 weights.
     void setDoppler(double theCentroid, int theDopplerBin, double theShift);
+
+    /// Every azimuth bin weighted 1: the look steps focus without the azimuth weights.
+    void setUniformWeights() { std::fill(mWeight.begin(), mWeight.end(), 1.0f); }
 
     /// The whole focusing of the block in place: azimuth FFT, Stolt mapping, range FFT, reference
     /// phase with weights and scale, inverse 2-D FFT.

@@ -6,6 +6,7 @@
 #include "qorv_enviroment.h"
 #include "qorv_errors.h"
 #include "qorv_generic_utility.h"
+#include "qorv_autofocus.h"
 #include "qorv_az_SLC.h"
 #include "qorv_azimuth_spectrum.h"
 #include "qorv_multi_SLC.h"
@@ -51,7 +52,7 @@ const CStepRow CQORV_STEP_TABLE[CQORV_STEP_NBR] = {
     {"Processing parameters construction", qorv_proc_param, fdfDefaultShut},
     {"SAR IQ raw data azimuth spectrum", qorv_azsp_IQ, qorv_azsp_IQ_shut},
     {"range compression", qorv_pre_rc, fdfDefaultShut},
-    {"autofocus", stepNotBuilt, fdfDefaultShut},
+    {"autofocus", qorv_autofocus, fdfDefaultShut},
     {"doppler ambiguity", stepNotBuilt, shutDopplerAmbiguity},
     {"SAR azimuth omega/k processor", qorv_az_SLC, qorv_az_SLC_shut},
     {"multi look", qorv_multi_SLC, fdfDefaultShut},
