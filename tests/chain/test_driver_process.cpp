@@ -122,19 +122,6 @@ TEST(DriverProcess, MissingInputWithArgumentElevenEndsSuccessfully)
     EXPECT_FALSE(std::filesystem::exists(aBox.data() / "x_par.sml"));
 }
 
-TEST(DriverProcess, AStepThatIsNotBuiltFailsLoudlyNamingIt)
-{
-    DriverSandbox aBox;
-    auto aArgs = DriverSandbox::defaultArguments(makeRaw(aBox, "raw"), aBox.data() / "x_slc");
-    aArgs[10] = "OK";                                // ambiguity resolution: step 4 comes first
-    aArgs[14] = aArgs[15] = aArgs[16] = "OK";         // skip steps 0, 1 and 2
-    RunResult aRun = aBox.run(aBox.writeArguments(aArgs));
-    expectFailureReported(aBox, aRun, 130560);
-    const std::string aWorking = qtest::readFile(aBox.workingFile());
-    EXPECT_NE(aWorking.find("doppler ambiguity"), std::string::npos) << aWorking;
-    EXPECT_NE(aBox.log().find("[ERROR ID : 130560]"), std::string::npos);
-}
-
 TEST(DriverProcess, AStopInTheWorkingFileEndsTheRunBeforeTheFirstStep)
 {
     DriverSandbox aBox;
@@ -210,7 +197,7 @@ TEST(DriverProcess, PrfExtractionRecordsSegmentsAndKeepsTheOriginalHeaderOnce)
     EXPECT_FALSE(std::filesystem::exists(aArgs[0] + "_old.sml"));
 }
 
-TEST(DriverProcess, ASimulatedErsSceneRunsThroughTheBuiltStepsAndStopsAtTheFirstMissingOne)
+TEST(DriverProcess, ASimulatedErsSceneRunsThroughTheWholeChain)
 {
     DriverSandbox aBox;
     const auto aRaw = aBox.data() / "sim_raw";
@@ -221,10 +208,13 @@ TEST(DriverProcess, ASimulatedErsSceneRunsThroughTheBuiltStepsAndStopsAtTheFirst
                                              {}, aBox.data());
     ASSERT_EQ(aSim.mStatus, 0) << aSim.mStderr;
     auto aArgs = DriverSandbox::defaultArguments(aRaw, aBox.data() / "sim_slc");
-    aArgs[10] = "OK";  // ambiguity resolution, not built yet
-    const RunResult aRun = aBox.run(aBox.writeArguments(aArgs));
-    expectFailureReported(aBox, aRun, 130560);
-    EXPECT_NE(qtest::readFile(aBox.workingFile()).find("step not built: doppler ambiguity"), std::string::npos);
+    aArgs[7] = "OK";   // intermediate files deleted
+    aArgs[10] = "OK";  // ambiguity resolution: steps 0, 1, 2, 4, 3, 3, 3 and 5
+    const RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 300);
+    ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr;
+    EXPECT_TRUE(std::filesystem::exists(aBox.data() / "sim_slc"));
+    EXPECT_FALSE(std::filesystem::exists(aBox.data() / "sim_rc__amb1_mli"));  // shut functions of steps 4 and 5
+    EXPECT_FALSE(std::filesystem::exists(aBox.data() / "sim_rc"));
     // The PRF scan found the simulated change, and step 0 made the parameter file.
     qtest::InProcessEnvironment aEnv;
     auto aHeader = readHeader(aRaw.string() + "_hdr");
