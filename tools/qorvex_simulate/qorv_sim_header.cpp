@@ -74,7 +74,7 @@ void fillProcessing(CDescriptionHeader& h, const CSimScene& s, const CSimSceneTr
     h["Processing.PixelSpacingAz"].setValue(t.mGroundVelocity / s.mRadar.mPrf);
     h["Processing.NRangeLooks"].setValue(1);
     h["Processing.NAzimuthLooks"].setValue(1);
-    setVector(h, "Processing.ProcessingVelocity", {t.mProcessingVelocity});
+    setVector(h, "Processing.ProcessingVelocity", {t.mProcessingVelocity * (1.0 + s.mHeaderVelocityError)});
     if (s.mWriteDoppler) {
         // The imported form: one row, the constant term of the polynomial in range.
         CDescriptionField& f = h["Processing.DopCenRangeCoeff"];

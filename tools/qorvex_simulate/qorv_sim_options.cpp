@@ -96,6 +96,7 @@ const std::map<std::string, Handler>& valueOptions()
          }},
         {"--scatterers", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mScatterers = toLong(o, v, 0, 10000000); }},
         {"--scatterer-rms", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mScattererRms = toDouble(o, v); }},
+        {"--velocity-error", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mHeaderVelocityError = toDouble(o, v); }},
         {"--scatterer-margin", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mScattererMargin = toLong(o, v, 0, 1000000); }},
         {"--seed", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mSeed = static_cast<uint64_t>(toLong(o, v, 0, 2147483647)); }},
         {"--drop-lines", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) {
@@ -195,6 +196,7 @@ Faults (at pulse indices):
 Output:
   --out ROOT               output root (default sim_<preset>)
   --write-doppler          write the true centroid as a one-row Processing.DopCenRangeCoeff
+  --velocity-error X       the header's processing velocity is the true one times 1 + X (default 0)
   --counter-start N        line counter of pulse 0
   --header-offset N        bytes before the first record
   --threads N              threads (default: all cores)

@@ -133,6 +133,7 @@ struct CSimScene {
     long mScatterers = 0;
     double mScattererRms = 0.1;          // rms reflectivity amplitude of a scatterer
     long mScattererMargin = 0;           // lines of the scatterer field beyond each end of the image
+    double mHeaderVelocityError = 0.0;   // relative error of the header's processing velocity
 
     // Noise and quantisation.
     bool mNoise = true;

@@ -353,7 +353,7 @@ CJson fqorvSimTruthJson(const CSimScene& s, const CSimSceneTruth& t, const CSimT
     CJson& vel = j["velocity"] = CJson::object();
     vel["true_processing_velocity"] = t.mProcessingVelocity;
     vel["vr_zero_doppler"] = t.mVrZeroDoppler;
-    vel["header_velocity"] = t.mProcessingVelocity;
+    vel["header_velocity"] = t.mProcessingVelocity * (1.0 + s.mHeaderVelocityError);
 
     CJson& lv = j["levels"] = CJson::object();
     lv["noise"] = s.mNoise;
