@@ -2,7 +2,8 @@
 # Focuses a full ERS frame (28,000 lines x 5,616 samples, 300 targets) through the driver: parameters,
 # range compression and omega-k focusing (steps 0, 2 and 5), on one thread and on two. For each run
 # it prints the wall time, the peak memory, the time of each step, the ratio of the wall time to
-# the FFT work of the same run, the ratio of range compression to its own line transforms (the range line transforms and the omega-k blocks, measured by
+# the FFT work of the same run, the ratio of range compression to its own line transforms; then the
+# point targets, and the time of each step of the whole chain with the estimators (the range line transforms and the omega-k blocks, measured by
 # bench_chain_fft right after it with the same thread count), then the point targets' worst figures.
 #
 #   bench/bench_chain.sh [build/bin]        (scratch files under $TMPDIR, about 3 GB, removed at the end)
@@ -47,5 +48,18 @@ for threads in 1 2; do
   awk -v r="$rcsec" -v f="$rgsec" 'BEGIN { printf "   range compression against its own transforms: %.2f\n", r / f }'
 done
 
-echo "== point targets of the SLC against the simulator's truth (worst case)"
+echo "== point targets of the SLC of steps 0, 2 and 5 against the simulator's truth (worst case)"
 "$bin/qorvex_irf" --slc "$dir/ers_slc" --truth "$dir/ers_raw_truth.json" --json "$dir/irf.json" | tail -n 6
+
+# The whole chain on the same frame, two threads: every estimator runs (its estimate on a frame of
+# isolated targets is not the point here, its cost is).
+rm -f "$dir"/ers_rc* "$dir/work/Process.trace"
+printf '%s\n' "bench: full ERS frame, whole chain" "$dir/ers_raw" OK "$dir/ers_slc_all" 1 5 NotOK NotOK NotOK 0.333 0 OK \
+  NotOK NotOK NotOK NotOK NotOK NotOK NotOK NotOK 0 > "$dir/args_all.txt"
+printf '0\nbench\n' > "$QORVEX_WORKING_FILE"
+QORVEX_THREADS=2 /usr/bin/time -f '%e %M' -o "$dir/time.txt" "$bin/qorvex" "$dir/args_all.txt" 2> "$dir/stderr.txt" ||
+  { cat "$dir/stderr.txt"; exit 1; }
+read -r wall rss < "$dir/time.txt"
+echo "== whole chain (steps 0, 1, 2, 4, 3, 3, 3, 5), 2 threads: wall $wall s, peak memory $((rss / 1024)) MB"
+sed -n 's/^DURATION \[\(.*\)\]  (s) = \(.*\)/   step "\1": \2 s/p' "$dir/work/Process.trace"
+
