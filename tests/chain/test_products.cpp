@@ -144,4 +144,53 @@ TEST(ChainProducts, TheOperatorsStopEndsEachLongStepWithoutAProduct)
     }
 }
 
+/// How many times theText stands in theTrace.
+std::size_t fCount(const std::string& theTrace, const std::string& theText)
+{
+    std::size_t n = 0;
+    for (std::size_t at = theTrace.find(theText); at != std::string::npos; at = theTrace.find(theText, at + 1)) ++n;
+    return n;
+}
+
+TEST(ChainProducts, AListOfProductsTakesTheEstimatesOfItsFirstProduct)
+{
+    qtest::DriverSandbox aBox;
+    const fs::path aScene = aBox.data() / "scene";
+    const std::vector<std::string> aArgsSim = {"--preset", "ers2", "--lines", "2048", "--samples", "1024", "--targets", "grid:2x2",
+                                               "--scatterers", "3000", "--scatterer-rms", "0.3", "--scatterer-margin", "1300",
+                                               "--velocity-error", "0.01", "--quiet", "--out", aScene.string(), "--config",
+                                               aBox.etc().string()};
+    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aArgsSim, {}, aBox.data()).mStatus, 0);
+    std::string aList;
+    for (const char* aName : {"a_raw", "b_raw"}) {
+        fs::copy_file(aScene, aBox.data() / aName);
+        fs::copy_file(aScene.string() + ".sml", (aBox.data() / aName).string() + ".sml");
+        aList += (aBox.data() / aName).string() + "\n";
+    }
+    qtest::writeFile(aBox.data() / "scenes_foc.list", aList);
+    auto aArgs = qtest::DriverSandbox::defaultArguments(aBox.data() / "scenes_foc.list", aBox.data() / "unused");
+    aArgs[10] = "OK";  // the whole chain for the first product, steps 0, 2 and 5 for the second
+    aArgs.push_back("0");
+    const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 600);
+    ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr << qtest::readFile(aBox.workingFile());
+    EXPECT_TRUE(fs::exists(aBox.data() / "a_slc"));
+    EXPECT_TRUE(fs::exists(aBox.data() / "b_slc"));
+    const std::string aTrace = qtest::readFile(aBox.work() / "Process.trace");
+    EXPECT_EQ(fCount(aTrace, "*** SAR IQ raw data azimuth spectrum"), 1u);
+    EXPECT_EQ(fCount(aTrace, "*** SAR Doppler ambiguity resolver"), 1u);
+    EXPECT_EQ(fCount(aTrace, "*** SAR autofocus"), 3u);
+    EXPECT_EQ(fCount(aTrace, "*** SAR azimuth omega/k processor"), 2u);
+
+    qtest::InProcessEnvironment aEnv;
+    auto aRcA = CDescriptionHeader::makeFull(), aRcB = CDescriptionHeader::makeFull();
+    ASSERT_TRUE(aRcA->read((aBox.data() / "a_rc_hdr").c_str(), true));
+    ASSERT_TRUE(aRcB->read((aBox.data() / "b_rc_hdr").c_str(), true));
+    EXPECT_DOUBLE_EQ(aRcB->getField("Processing.DopCenRangeCoeff").getDouble(0, 2),
+                     aRcA->getField("Processing.DopCenRangeCoeff").getDouble(0, 2));
+    CDescriptionHeader aParA({"sar_processing"}), aParB({"sar_processing"});
+    ASSERT_TRUE(aParA.read((aBox.data() / "a_par").c_str(), true));
+    ASSERT_TRUE(aParB.read((aBox.data() / "b_par").c_str(), true));
+    EXPECT_DOUBLE_EQ(aParB["sar_processing.Velocity"].getDouble(), aParA["sar_processing.Velocity"].getDouble());
+}
+
 }  // namespace
