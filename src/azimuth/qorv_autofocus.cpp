@@ -22,29 +22,18 @@ namespace {
 constexpr int CQORV_AF_MAX_WIDTH = 2048;
 constexpr int CQORV_AF_INTERPOLATION = 1024;
 
-std::unique_ptr<CDescriptionHeader> fReadHeader(const std::string& theName, const char* theWords,
-                                                std::unique_ptr<CDescriptionHeader> theHeader)
-{
-    if (!theHeader->read(theName.c_str(), false)) {
-        fdfTrace("%s%s\n", theWords, theName.c_str());
-        QORV_FATAL(CQORV_ERR_MISSING_FILE, theName.c_str());
-    }
-    return theHeader;
-}
-
 /// Arguments, headers, sizes and the geometry set-up; false when the header asks to skip.
 bool fSetUp(int argc, char** argv, CLookRun& r, std::string& theParFile, std::unique_ptr<CDescriptionHeader>& theInput,
             std::unique_ptr<CDescriptionHeader>& thePar)
 {
     r.mInput = argv[1];
     theParFile = argv[2];
-    theInput = fReadHeader(r.mInput + "_hdr", "Error: missing parameter file ", CDescriptionHeader::makeFull());
+    theInput = fqorvReadStepHeader(r.mInput + "_hdr", "Error: missing parameter file ", false);
     if (fqorvHasValue(*theInput, "Processing.UserSkipAutofocus")) {
         fdfTrace("Skipp autofocus\n");
         return false;
     }
-    thePar = fReadHeader(theParFile, "Error: missing processing parameter file ",
-                         std::make_unique<CDescriptionHeader>(std::initializer_list<const char*>{"sar_processing"}));
+    thePar = fqorvReadStepHeader(theParFile, "Error: missing processing parameter file ", true);
     const CDescriptionHeader& in = *theInput;
     const CDescriptionHeader& par = *thePar;
     r.psf = argc > 3 ? std::max(1, std::atoi(argv[3])) : std::max(1, par["sar_processing.AzPresumming"].getInteger());

@@ -35,7 +35,6 @@
 namespace {
 
 constexpr double CSAR_C = 299792458.0;
-const double aTwoPi = 2.0 * M_PI;
 constexpr int CQORV_AZ_ARGUMENT_NBR = 9;
 constexpr int CQORV_FIXED_AZ_FFT = 16384;
 constexpr unsigned CQORV_MAX_BLOCK_SAMPLES = 134217728u;
@@ -85,18 +84,6 @@ void fProgress(int& thePercent, int theNewPercent)
     thePercent = theNewPercent;
 }
 
-std::unique_ptr<CDescriptionHeader> fReadHeader(const std::string& theName, const char* theWords, bool theParOnly)
-{
-    std::unique_ptr<CDescriptionHeader> aHeader =
-        theParOnly ? std::make_unique<CDescriptionHeader>(std::initializer_list<const char*>{"sar_processing"})
-                   : CDescriptionHeader::makeFull();
-    if (!aHeader->read(theName.c_str(), false)) {
-        fdfTrace("%s%s\n", theWords, theName.c_str());
-        QORV_FATAL(CQORV_ERR_MISSING_FILE, theName.c_str());
-    }
-    return aHeader;
-}
-
 /// Step 1: the transform sizes.
 void fFftSizes(const CDescriptionHeader& theInput, const CDescriptionHeader& thePar, int argc, char** argv,
                CAzSlcParam& p)
@@ -142,8 +129,8 @@ void fSetUp(int argc, char** argv, YDF_SAR& theSar, std::unique_ptr<CDescription
     read_image_info(p.mInput.c_str(), theSar);
     p.mLines = theSar.nrow;
 
-    theInput = fReadHeader(p.mInput + "_hdr", "Error: missing parameter file ", false);
-    thePar = fReadHeader(p.mParFile, "Error: missing processing parameter file ", true);
+    theInput = fqorvReadStepHeader(p.mInput + "_hdr", "Error: missing parameter file ", false);
+    thePar = fqorvReadStepHeader(p.mParFile, "Error: missing processing parameter file ", true);
     CDescriptionHeader& aPar = *thePar;
     p.psf = std::max(std::atoi(argv[4]), 1);
     p.ndec = std::max(std::atoi(argv[5]), 1);
@@ -396,11 +383,8 @@ void fProcessSubaperture(YDF_SAR& theSar, CRasterFile& theIn, CRasterFile& theOu
                          double fd, CBlockState& st)
 {
     double fdc = p.subapertureCentroid(i, fd);
-    double ws = aTwoPi * fdc / p.prf();
-    if (ws < 0.0) ws += aTwoPi;
-    const double ws1 = std::fmod(p.psf * ws, aTwoPi);
-    const double ws2 = std::fmod(p.psf * p.ndec * ws, aTwoPi);
-    fdfTrace("dop. cent.(Hz), ws ws1 ws2 (radians):  %f %f %f %f\n", fdc, ws, ws1, ws2);
+    double ws = 0.0, ws1 = 0.0, ws2 = 0.0;
+    fqorvSubapertureAngles(p.mGeometry, fdc, ws, ws1, ws2);
     const int aRefPoints = p.mGeometry.apertureLines(p.bandwidth(), p.mGeometry.fmRateSquinted(fdc));
     fdfTrace("az. ref. nom. #points (m, az. pixels): %f %d\n", aRefPoints * p.mGeometry.mSpacingNoOrbit, aRefPoints);
 
@@ -444,17 +428,7 @@ void fProcessSubaperture(YDF_SAR& theSar, CRasterFile& theIn, CRasterFile& theOu
 void fProcessBlocks(YDF_SAR& theSar, CRasterFile& theIn, CRasterFile& theOut, CAzSlcParam& p, int& thePercent,
                     CBlockState& st)
 {
-    COmegaKParam aKernel;
-    aKernel.mAzimuthFftSize = p.nazft;
-    aKernel.mRangeFftSize = p.nrfft;
-    aKernel.mPrf = p.prf();
-    aKernel.mSamplingRate = p.mGeometry.mIn.mSamplingRate;
-    aKernel.mCarrierFrequency = p.mGeometry.mIn.mCarrierFrequency;
-    aKernel.mVelocity = p.mGeometry.mIn.mVelocity;
-    aKernel.mNearRange = p.mGeometry.mIn.mNearRange;
-    aKernel.mBandFraction = p.bandFraction();
-    aKernel.mPresumming = p.psf;
-    aKernel.mDecimation = p.ndec;
+    COmegaKParam aKernel = fqorvBlockParam(p.mGeometry, p.nazft, p.nrfft, 0);
     aKernel.mHalfPixelShift = p.mHalfPixelShift;
     const int aThreads = fqorvThreadCount();
     fqorvFftSetThreads(aThreads);

@@ -26,16 +26,6 @@ namespace {
 constexpr int CQORV_AMB_MAX_WIDTH = 1024;
 constexpr double CSAR_C = 299792458.0;
 
-std::unique_ptr<CDescriptionHeader> fReadHeader(const std::string& theName, const char* theWords,
-                                                std::unique_ptr<CDescriptionHeader> theHeader)
-{
-    if (!theHeader->read(theName.c_str(), false)) {
-        fdfTrace("%s%s\n", theWords, theName.c_str());
-        QORV_FATAL(CQORV_ERR_MISSING_FILE, theName.c_str());
-    }
-    return theHeader;
-}
-
 /// Writes a detected look as bytes: 63.75 / mean of the non-zero cells, clipped at 255; with no
 /// such cell the mean is taken as 1.0.
 void fWriteLook(const CDescriptionHeader& theInput, const std::string& theName, const std::vector<fcomplex>& theImage,
@@ -151,14 +141,13 @@ int qorv_doppler_ambiguity(int argc, char** argv)
     r.mInput = argv[1];
     const std::string aParFile = argv[2], aHeaderName = r.mInput + "_hdr";
     std::unique_ptr<CDescriptionHeader> aInput =
-        fReadHeader(aHeaderName, "Error: missing parameter file ", CDescriptionHeader::makeFull());
+        fqorvReadStepHeader(aHeaderName, "Error: missing parameter file ", false);
     if (fqorvHasValue(*aInput, "Processing.UserSkipDopplerEst")) {
         fdfTrace("Skipp doppler ambiguity\n");
         return 0;
     }
     std::unique_ptr<CDescriptionHeader> aPar =
-        fReadHeader(aParFile, "Error: missing processing parameter file ",
-                    std::make_unique<CDescriptionHeader>(std::initializer_list<const char*>{"sar_processing"}));
+        fqorvReadStepHeader(aParFile, "Error: missing processing parameter file ", true);
     CDescriptionHeader& in = *aInput;
     const int aLines = (*aPar)["sar_processing.ProcessedLines"].getInteger();
     if (argc > 3) r.psf = std::max(1, std::atoi(argv[3]));

@@ -190,3 +190,28 @@ void fqorvWriteGeometryFields(const CSpaceborneGeometry& theGeometry, const CDes
     if (!aTable.isInitialised()) aTable.resize(1, aTableForm ? 3 : 1);
     for (int r = 0; r < aTable.getNbrOfRows(); ++r) aTable.setValue(r, aTableForm ? 2 : 0, aUser);
 }
+
+COmegaKParam fqorvBlockParam(const CSpaceborneGeometry& g, int theAzimuthFftSize, int theRangeFftSize, int theFirstColumn)
+{
+    COmegaKParam k;
+    k.mAzimuthFftSize = theAzimuthFftSize;
+    k.mRangeFftSize = theRangeFftSize;
+    k.mPrf = g.mIn.mPrf;
+    k.mSamplingRate = g.mIn.mSamplingRate;
+    k.mCarrierFrequency = g.mIn.mCarrierFrequency;
+    k.mVelocity = g.mIn.mVelocity;
+    k.mNearRange = g.mIn.mNearRange + g.mRangeSpacing * theFirstColumn;
+    k.mBandFraction = g.mIn.mBandFraction;
+    k.mPresumming = g.mIn.mPresumming;
+    k.mDecimation = g.mIn.mDecimation;
+    return k;
+}
+
+void fqorvSubapertureAngles(const CSpaceborneGeometry& g, double theCentroid, double& ws, double& ws1, double& ws2)
+{
+    ws = aTwoPi * theCentroid / g.mIn.mPrf;
+    if (ws < 0.0) ws += aTwoPi;
+    ws1 = std::fmod(g.mIn.mPresumming * ws, aTwoPi);
+    ws2 = std::fmod(g.mIn.mPresumming * g.mIn.mDecimation * ws, aTwoPi);
+    fdfTrace("dop. cent.(Hz), ws ws1 ws2 (radians):  %f %f %f %f\n", theCentroid, ws, ws1, ws2);
+}

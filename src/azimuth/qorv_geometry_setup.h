@@ -5,6 +5,8 @@
 
 #include <string>
 
+#include "qorv_omegak_kernel.h"
+
 class CDescriptionHeader;
 
 /// Where a step's block and subaperture loops evaluate the Doppler centroid.
@@ -95,6 +97,16 @@ CGeometryInput fqorvReadGeometryInput(const CDescriptionHeader& theData, const C
 /// Computes the set-up for the Doppler centroid theCentroid (Hz) and prints every value to the
 /// trace under its label.
 CSpaceborneGeometry fqorvSpaceborneGeometry(const CGeometryInput& theIn, double theCentroid);
+
+/// The block focuser's constants for a block of theAzimuthFftSize x theRangeFftSize samples whose
+/// column 0 lies theFirstColumn range samples beyond the near range.
+COmegaKParam fqorvBlockParam(const CSpaceborneGeometry& theGeometry, int theAzimuthFftSize, int theRangeFftSize,
+                             int theFirstColumn);
+
+/// The phase steps of a subaperture centroid theCentroid (Hz): ws = 2 pi fdc / PRF (plus 2 pi when
+/// negative), ws1 = psf ws and ws2 = psf ndec ws, both modulo 2 pi; radians per line.
+void fqorvSubapertureAngles(const CSpaceborneGeometry& theGeometry, double theCentroid, double& ws, double& ws1,
+                            double& ws2);
 
 /// Writes spacing and resolution in both directions and "ProcessingVelocity"[0] to theTarget, and,
 /// when theSource sets "UserDopCenRangeCoeff", its [0][0] as the constant term of theTarget's

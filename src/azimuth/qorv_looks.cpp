@@ -18,8 +18,6 @@
 
 namespace {
 
-constexpr double aTwoPi = 2.0 * M_PI;
-
 int fLargestPowerOfTwo(double theLimit)
 {
     int p = 1;
@@ -34,11 +32,8 @@ void fLook(CRasterFile& theIn, const CLookRun& r, COmegaKBlockFocuser& theFocuse
 {
     fdfTrace("\n%s%d\n", theTitle, i);
     const double fdc = r.lookCentroid(i);
-    double ws = aTwoPi * fdc / r.prf();
-    if (ws < 0.0) ws += aTwoPi;
-    const double ws1 = std::fmod(r.psf * ws, aTwoPi);
-    const double ws2 = std::fmod(r.psf * r.ndec * ws, aTwoPi);
-    fdfTrace("dop. cent.(Hz), ws ws1 ws2 (radians):  %f %f %f %f\n", fdc, ws, ws1, ws2);
+    double ws = 0.0, ws1 = 0.0, ws2 = 0.0;
+    fqorvSubapertureAngles(r.mGeometry, fdc, ws, ws1, ws2);
 
     std::vector<fcomplex> aLine(static_cast<std::size_t>(r.mWidth));
     const QorvLineReader aRead = [&](int theLine, fcomplex* theRow) {
@@ -108,17 +103,7 @@ void fqorvLookSetUp(const CDescriptionHeader& theInput, const CDescriptionHeader
 void fqorvFocusLooks(CRasterFile& theIn, const CLookRun& r, const char* theTitle, std::vector<fcomplex>& theFirst,
                      std::vector<fcomplex>& theLast)
 {
-    COmegaKParam k;
-    k.mAzimuthFftSize = r.nazft;
-    k.mRangeFftSize = r.w;
-    k.mPrf = r.prf();
-    k.mSamplingRate = r.mGeometry.mIn.mSamplingRate;
-    k.mCarrierFrequency = r.mGeometry.mIn.mCarrierFrequency;
-    k.mVelocity = r.mGeometry.mIn.mVelocity;
-    k.mNearRange = r.mGeometry.mIn.mNearRange + r.mGeometry.mRangeSpacing * r.mColumn0;
-    k.mBandFraction = r.mGeometry.mIn.mBandFraction;
-    k.mPresumming = r.psf;
-    k.mDecimation = r.ndec;
+    const COmegaKParam k = fqorvBlockParam(r.mGeometry, r.nazft, r.w, r.mColumn0);
     const int aThreads = fqorvThreadCount();
     fqorvFftSetThreads(aThreads);
     COmegaKBlockFocuser aFocuser(k, aThreads);

@@ -61,16 +61,6 @@ struct CRangeCompressionRun {
     int circularRows() const { return D == 1 ? 1 : 2 * taps(); }
 };
 
-std::unique_ptr<CDescriptionHeader> fReadHeader(const std::string& theName, const char* theWords,
-                                                std::unique_ptr<CDescriptionHeader> theHeader)
-{
-    if (!theHeader->read(theName.c_str(), false)) {
-        fdfTrace("%s%s\n", theWords, theName.c_str());
-        QORV_FATAL(CQORV_ERR_MISSING_FILE, theName.c_str());
-    }
-    return theHeader;
-}
-
 void fUsage(const char* theProgram)
 {
     fdfTrace("\nusage: %s <signal_data> <rc_data> <proc_par> [prefilter] [offset] [nl] [aRgFFTSize]\n",
@@ -510,14 +500,13 @@ int qorv_pre_rc(int argc, char** argv)
         QORV_FATAL(CQORV_ERR_ARGUMENT_COUNT, "");
     }
     std::unique_ptr<CDescriptionHeader> aInput =
-        fReadHeader(std::string(argv[1]) + "_hdr", "Error: missing parameter file ", CDescriptionHeader::makeFull());
+        fqorvReadStepHeader(std::string(argv[1]) + "_hdr", "Error: missing parameter file ", false);
     if (fqorvHasValue(*aInput, "Processing.UserSkipRangeCompression")) {
         fdfTrace("range compression skipped by the user\n");
         return 0;
     }
     std::unique_ptr<CDescriptionHeader> aPar =
-        fReadHeader(argv[3], "Error: missing processing parameter file ",
-                    std::make_unique<CDescriptionHeader>(std::initializer_list<const char*>{"sar_processing"}));
+        fqorvReadStepHeader(argv[3], "Error: missing processing parameter file ", true);
     CRangeCompressionRun r;
     fSetUp(argc, argv, r, aInput, aPar);
 

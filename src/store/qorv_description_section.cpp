@@ -689,3 +689,15 @@ bool fqorvHasValue(const CDescriptionHeader& theHeader, const char* theKey)
     const CDescriptionField* aField = theHeader.findField(theKey);
     return aField != nullptr && aField->isInitialised();
 }
+
+std::unique_ptr<CDescriptionHeader> fqorvReadStepHeader(const std::string& theName, const char* theWords, bool theParameters)
+{
+    std::unique_ptr<CDescriptionHeader> aHeader =
+        theParameters ? std::make_unique<CDescriptionHeader>(std::initializer_list<const char*>{"sar_processing"})
+                      : CDescriptionHeader::makeFull();
+    if (!aHeader->read(theName.c_str(), false)) {
+        fdfTrace("%s%s\n", theWords, theName.c_str());
+        QORV_FATAL(CQORV_ERR_MISSING_FILE, theName.c_str());
+    }
+    return aHeader;
+}

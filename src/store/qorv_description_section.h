@@ -223,6 +223,11 @@ public:
     std::string mRootTag = "HEADER_INFO";
 };
 
+/// The header of a step's input: all 21 sections, or the "sar_processing" section alone for a
+/// processing parameter file (theParameters). A file that cannot be read traces theWords and the
+/// name and is failure 261122.
+std::unique_ptr<CDescriptionHeader> fqorvReadStepHeader(const std::string& theName, const char* theWords, bool theParameters);
+
 /// True when the header has the field theKey and it holds a value: what "present" means for a field.
 bool fqorvHasValue(const CDescriptionHeader& theHeader, const char* theKey);
 
