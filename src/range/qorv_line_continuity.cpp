@@ -103,6 +103,7 @@ CContinuityDecision CLineContinuity::check(const uint8_t* thePrefix, CContinuity
     // At priming the rows before the first record may stay empty: its row number is no test.
     const int aLine = theRoad == CContinuityRoad::Priming && !mAccepted ? 0 : theLine;
     aDecision = aErsEnvisat ? checkErsEnvisat(theRoad, aLine, theRecord) : checkJersAlos(aLine);
+    aDecision.mFillerShift = aDecision.mShift = mShift;
     if (aDecision.mDrop) return aDecision;
     mAccepted = true;
     if (hasSlantRange(mLayout.mProduct)) {
@@ -112,6 +113,7 @@ CContinuityDecision CLineContinuity::check(const uint8_t* thePrefix, CContinuity
     }
     if (mSwstOnly)
         std::fprintf(mSwstOnly, "%d\t\tLC: %d\t%d\t%d\t%d\n", theRecord, mLineCounter, mSwstCounter, mSwstStep, mShift);
+    aDecision.mShift = mShift;
     return aDecision;
 }
 

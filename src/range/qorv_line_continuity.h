@@ -22,8 +22,14 @@ struct CContinuityDecision {
     /// Direct road, ERS and ENVISAT: lost lines to fill with the echo in hand before it (each filler
     /// shifted once more by the current shift).
     int mFillers = 0;
-    /// Output lines (direct road, refill) or buffer rows (priming) to move on before this echo.
+    /// Lines the loop's count moves on before this echo: output lines (direct road), input lines
+    /// (refill) or buffer rows (priming).
     int mSkip = 0;
+    /// The shift the fillers move by: the one in force when the gap was found, before this
+    /// record's SWST code is taken.
+    int mFillerShift = 0;
+    /// The shift s after this record, by which its compressed line moves.
+    int mShift = 0;
 };
 
 /// Prefix positions and sizes the kernel needs; -1 marks a value the records do not carry.

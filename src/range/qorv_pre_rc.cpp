@@ -374,9 +374,10 @@ void fDirectLoop(CLoopState& s, const CRangeCompressionRun& r)
             --i;
             continue;
         }
-        // Lost lines are filled with the echo in hand, still raw, each shifted once more.
+        // Lost lines are filled with the echo in hand, still raw, each shifted once more by the
+        // shift in force before this record's SWST code.
         for (int k = 0; k < d.mFillers && i < r.nl; ++k) {
-            fqorvShiftLine(w, r.aRangeOut, s.mContinuity.shift());
+            fqorvShiftLine(w, r.aRangeOut, d.mFillerShift);
             fqorvWriteLine(s.mOut, w, i++);
         }
         i += d.mSkip;
@@ -468,7 +469,7 @@ void fPrefilterLoop(CLoopState& s, const CRangeCompressionRun& r, const std::vec
                 if (!aFilling || aActRow >= r.mRasterLines) continue;
                 int aSkip = 0;
                 aFilling = fReadBufferedRow(s, r, aActRow, aRow, CContinuityRoad::Refill, i, aSkip);
-                i += aSkip * r.D;
+                i += aSkip;  // i counts input lines: the lost ones move it on
             }
             std::rotate(b.mRows.begin(), b.mRows.begin() + h, b.mRows.end());
             h = 0;

@@ -108,6 +108,16 @@ TEST(LineContinuity, SamplingWindowChangesBecomeRangeShifts)
     EXPECT_EQ(aShiftAfter(CSAR_SENSOR_ERS2_ID, 210, 214, 0, 1100), 0);       // too far: warned, kept
     EXPECT_EQ(aShiftAfter(CSAR_SENSOR_ENVISAT1_ID, 54, 58, 300, 307), 7);    // the code difference itself
 
+    {  // a gap on the record that changes the window: the fillers keep the shift in force before it
+        CLineContinuity c = fKernel(CSAR_SENSOR_ERS2_ID);
+        c.check(fPrefix(210, 1, 214, 1000).data(), CContinuityRoad::Direct, 0, 0);
+        c.check(fPrefix(210, 2, 214, 1022).data(), CContinuityRoad::Direct, 1, 1);
+        const CContinuityDecision d = c.check(fPrefix(210, 5, 214, 1044).data(), CContinuityRoad::Direct, 2, 2);
+        EXPECT_EQ(d.mFillers, 2);
+        EXPECT_EQ(d.mFillerShift, 88);
+        EXPECT_EQ(d.mShift, 176);
+    }
+
     // ALOS products: the shift follows the slant range of the first sample; a wild value (half a
     // line or more) keeps the earlier shift.
     CLineContinuity c = fKernel(CSAR_SENSOR_ALOS_PALSAR_ID, CQORV_ORIG_PROD_ALOS_PALSAR_FBS10_ID);
@@ -222,17 +232,68 @@ TEST(RangeCompressionDriver, TargetsCompressAndFocusToTheirIdealResponsesOnEachS
     }
 }
 
+/// The lines of a range compressed product.
+std::vector<std::vector<fcomplex>> fReadProduct(const fs::path& theRc)
+{
+    qtest::InProcessEnvironment aEnv;
+    auto aHeader = CDescriptionHeader::makeFull();
+    EXPECT_TRUE(aHeader->read((theRc.string() + "_hdr").c_str(), true));
+    CRasterFileParam aParam;
+    fqorvRasterParamFromHeader(*aHeader, theRc.c_str(), aParam);
+    CRasterFile aRc;
+    aRc.openRead(aParam);
+    std::vector<std::vector<fcomplex>> aLines(static_cast<std::size_t>(aParam.mNrOfLinesPerImage),
+                                              std::vector<fcomplex>(static_cast<std::size_t>(aParam.mNrOfPixelsPerLine)));
+    for (std::size_t i = 0; i < aLines.size(); ++i) fqorvReadLine(aRc, aLines[i].data(), static_cast<int>(i));
+    return aLines;
+}
+
 TEST(RangeCompressionDriver, LostRepeatedAndShiftedLinesKeepEveryEchoInPlace)
 {
-    qtest::DriverSandbox aBox;
-    const qtest::RunResult aRun = fSimulateAndRun(
-        aBox, {"--preset", "ers2", "--lines", "3072", "--samples", "1280", "--targets", "grid:2x2", "--drop-lines",
-               "1100,1101,1102,1700", "--repeat-line", "1400", "--swst-change", "2000:22"});
+    // The same scene with and without faults: three lost pulses, a repeated one, a fourth lost
+    // one and a window opened 22 codes later. Every echo of the faulty scene, the one right after
+    // the repeat included, must land on the output line and range samples of the clean scene; the
+    // lost lines hold fillers and a shifted line loses its first 88 samples.
+    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "3072", "--samples", "1280", "--targets", "grid:2x2"};
+    std::vector<std::string> aFaulty = aScene;
+    for (const char* a : {"--drop-lines", "1100,1101,1102,1700", "--repeat-line", "1400", "--swst-change", "2000:22"})
+        aFaulty.push_back(a);
+    qtest::DriverSandbox aCleanBox, aBox;
+    ASSERT_EQ(fSimulateAndRun(aCleanBox, aScene).mStatus, 0);
+    const qtest::RunResult aRun = fSimulateAndRun(aBox, aFaulty);
     ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr;
     const std::string aTrace = qtest::readFile(aBox.work() / "Process.trace");
-    EXPECT_NE(aTrace.find(" duplicate line line(s) detected at line: "), std::string::npos);
+    EXPECT_NE(aTrace.find(" duplicate line line(s) detected at line: 1401"), std::string::npos);
     EXPECT_NE(aTrace.find("vtest_missing_line_found_total: 4"), std::string::npos);
-    EXPECT_NE(aTrace.find("WARNING: 22 swst code change detected at line: "), std::string::npos);
+    EXPECT_NE(aTrace.find("WARNING: 22 swst code change detected at line: 2000"), std::string::npos);
+
+    const auto aClean = fReadProduct(aCleanBox.data() / "scene_rc");
+    const auto aLines = fReadProduct(aBox.data() / "scene_rc");
+    ASSERT_EQ(aLines.size() + 3, aClean.size());  // four pulses lost, one recorded twice
+    float aPeak = 0.0f;
+    for (const auto& l : aClean)
+        for (const fcomplex& z : l) aPeak = std::max(aPeak, std::abs(z));
+    int aWorst = -1, aLit = 0;
+    float aWorstError = 0.0f;
+    for (int i = 0; i < static_cast<int>(aLines.size()); ++i) {
+        if ((i >= 1100 && i <= 1102) || i == 1700) continue;
+        const std::size_t aFrom = i >= 2000 ? 88 : 0;
+        float aError = 0.0f, aLine = 0.0f;
+        for (std::size_t p = aFrom; p < aLines[i].size(); ++p) {
+            aError = std::max(aError, std::abs(aLines[i][p] - aClean[i][p]));
+            aLine = std::max(aLine, std::abs(aClean[i][p]));
+        }
+        if (i >= 2000) {
+            EXPECT_EQ(std::abs(aLines[i][0]) + std::abs(aLines[i][87]), 0.0f);
+        }
+        aLit += aLine > 0.1f * aPeak;
+        if (aError > aWorstError) {
+            aWorstError = aError;
+            aWorst = i;
+        }
+    }
+    EXPECT_LT(aWorstError, 1e-4f * aPeak) << "worst at line " << aWorst;
+    EXPECT_GT(aLit, 2000);
     qtest::expectIdealTargets(aBox, aBox.data() / "scene_slc", aBox.data() / "raw_truth.json", 4);
 }
 
