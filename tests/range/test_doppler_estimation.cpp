@@ -1,6 +1,6 @@
 // The Doppler centroid estimator on clutter of known spectrum (complex Gaussian noise filtered in
 // azimuth by a band centred on a chosen centroid): the table must give the centroid back, modulo
-// the PRF, anywhere in the band. Then step 1 through the driver on a simulated ERS scene.
+// the PRF, anywhere in the band. Then step 1 through the driver on simulated ERS and ENVISAT scenes.
 #include <gtest/gtest.h>
 
 #include <cmath>
@@ -86,31 +86,35 @@ TEST(DopplerEstimation, TheTableGivesTheCentroidBackAcrossTheBand)
     }
 }
 
-TEST(DopplerEstimation, StepOneFindsTheCentroidOfASimulatedErsScene)
+TEST(DopplerEstimation, StepOneFindsTheCentroidOfSimulatedErsAndEnvisatScenes)
 {
     // Clutter beyond both ends of the image, so that the first and last lines see scatterers on
     // both sides of the beam, as a cut from a longer pass does.
-    qtest::DriverSandbox aBox;
-    const fs::path aRaw = aBox.data() / "scene_raw";
-    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "4096", "--samples", "1024", "--targets", "grid:2x2",
-                                             "--scatterers", "6000", "--scatterer-rms", "0.5", "--scatterer-margin", "1300",
-                                             "--quiet", "--out", aRaw.string(), "--config", aBox.etc().string()};
-    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
-    auto aArgs = qtest::DriverSandbox::defaultArguments(aRaw, aBox.data() / "scene_slc");
-    aArgs[17] = "OK";  // no autofocus: steps 0, 1, 2 and 5
-    const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 600);
-    ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr << qtest::readFile(aBox.workingFile());
-    EXPECT_TRUE(fs::exists(aBox.data() / "scene_slc"));
-    EXPECT_FALSE(fs::exists(aBox.data() / "scene_azsp"));
+    for (const char* aPreset : {"ers2", "envisat"}) {
+        SCOPED_TRACE(aPreset);
+        qtest::DriverSandbox aBox;
+        const fs::path aRaw = aBox.data() / "scene_raw";
+        const std::vector<std::string> aScene = {"--preset", aPreset, "--lines", "4096", "--samples", "1024", "--targets",
+                                                 "grid:2x2", "--scatterers", "6000", "--scatterer-rms", "0.5",
+                                                 "--scatterer-margin", "1300", "--quiet", "--out", aRaw.string(), "--config",
+                                                 aBox.etc().string()};
+        ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+        auto aArgs = qtest::DriverSandbox::defaultArguments(aRaw, aBox.data() / "scene_slc");
+        aArgs[17] = "OK";  // no autofocus: steps 0, 1, 2 and 5
+        const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 600);
+        ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr << qtest::readFile(aBox.workingFile());
+        EXPECT_TRUE(fs::exists(aBox.data() / "scene_slc"));
+        EXPECT_FALSE(fs::exists(aBox.data() / "scene_azsp"));
 
-    const CJson aTruth = CJson::parseFile(aRaw.string() + "_truth.json");
-    const double aPrf = aTruth["radar"]["prf"].number(), aCentroid = aTruth["doppler"]["centroid"].number();
-    qtest::InProcessEnvironment aEnv;
-    YDF_SAR aSar;
-    read_image_info(aRaw.c_str(), aSar);
-    ASSERT_TRUE(aSar.mDopplerTableEstimated);
-    for (const double aLine : {1024.0, 2048.0, 3072.0})
-        EXPECT_LT(std::fabs(aSar.getDopplerFromPixel(512, aLine, false, false) - aCentroid), 0.005 * aPrf) << "line " << aLine;
+        const CJson aTruth = CJson::parseFile(aRaw.string() + "_truth.json");
+        const double aPrf = aTruth["radar"]["prf"].number(), aCentroid = aTruth["doppler"]["centroid"].number();
+        qtest::InProcessEnvironment aEnv;
+        YDF_SAR aSar;
+        read_image_info(aRaw.c_str(), aSar);
+        ASSERT_TRUE(aSar.mDopplerTableEstimated);
+        for (const double aLine : {1024.0, 2048.0, 3072.0})
+            EXPECT_LT(std::fabs(aSar.getDopplerFromPixel(512, aLine, false, false) - aCentroid), 0.005 * aPrf) << "line " << aLine;
+    }
 }
 
 }  // namespace
