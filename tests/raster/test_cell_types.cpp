@@ -1,4 +1,4 @@
-// Cell type and data unit tables.
+// Cell type names, sizes and the unknown-code failure.
 #include <gtest/gtest.h>
 
 #include "qorv_cell_types.h"
@@ -14,14 +14,10 @@ TEST(CellTypes, NamesCodesAndSizes)
         EXPECT_EQ(b, aBytes[i]) << fqorvCellTypeName(i);
         EXPECT_EQ(n, fqorvCellTypeIsComplex(i) ? 2 : 1);
     }
-    EXPECT_STREQ(fqorvCellTypeName(CQORV_CELL_UBYTE_COMPLEX), "UBYTE_COMPLEX");
-    EXPECT_STREQ(fqorvCellTypeName(CQORV_CELL_UNSIGNED_SHORT_COMPLEX), "UNSIGNED_SHORT_COMPLEX");
     EXPECT_STREQ(fqorvCellTypeName(15), "WRONG CELL TYPE");
     EXPECT_STREQ(fqorvCellTypeName(-1), "WRONG CELL TYPE");
     EXPECT_EQ(fqorvCellTypeFromName("float_complex"), -1);  // exact text only
     EXPECT_EQ(fqorvCellTypeFromName(nullptr), -1);
-    EXPECT_TRUE(fqorvCellTypeIsComplex(CQORV_CELL_UBYTE_COMPLEX));
-    EXPECT_FALSE(fqorvCellTypeIsComplex(CQORV_CELL_BIT));
 }
 
 TEST(CellTypes, UnknownCodeReportsOnTheTrace)
@@ -31,21 +27,4 @@ TEST(CellTypes, UnknownCodeReportsOnTheTrace)
     EXPECT_EQ(fqorvCellTypeSize(99, b, n), -1);
     EXPECT_EQ(b, -1);
     EXPECT_NE(aEnv.trace().find("Error: unsupported raster file type 99"), std::string::npos);
-}
-
-TEST(DataUnits, TextsAndTheMissingCode)
-{
-    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_POWER), "POWER");
-    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_SLC), "SLC");
-    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_JERS1_RAW), "JERS 1 RAW");
-    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_SIRC_RAW), "SIR-C RAW");
-    EXPECT_STREQ(fqorvDataUnitsName(CQORV_UNITS_REFLECTANCE), "REFLECTANCE");
-    EXPECT_STREQ(fqorvDataUnitsName(21), "WRONG UNITS");
-    EXPECT_STREQ(fqorvDataUnitsName(39), "WRONG UNITS");
-    for (int i = 0; i <= CQORV_DATA_UNITS_MAX; ++i)
-        if (i != 21) {
-            EXPECT_EQ(fqorvDataUnitsFromName(fqorvDataUnitsName(i)), i);
-        }
-    EXPECT_EQ(fqorvDataUnitsFromName("WRONG UNITS"), -1);
-    EXPECT_EQ(fqorvDataUnitsFromName("LOGARITMIC"), CQORV_UNITS_LOGARITMIC);
 }
