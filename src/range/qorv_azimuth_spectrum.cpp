@@ -54,8 +54,9 @@ int qorv_azsp_IQ(int argc, char** argv)
         aAzCoeff = std::atoi(argv[CQORV_ASIQ_POL_DEG_AZ_DOPP_POS]);
         fdfTrace("aAzCoeff = %d\n", aAzCoeff);
     }
-    if (!fdfEstimateDoppler(argv[1], aAzCoeff, 0, CQORV_DOPPLER_TABLE_ROWS, false))
-        QORV_FATAL(CQORV_ERR_RASTER_ACCESS, argv[1]);
+    std::string aReason;
+    if (!fdfEstimateDoppler(argv[1], aAzCoeff, 0, CQORV_DOPPLER_TABLE_ROWS, false, &aReason))
+        QORV_FATAL(CQORV_ERR_RASTER_ACCESS, (std::string(argv[1]) + ": no Doppler centroid estimate, " + aReason).c_str());
     YDF_SAR aSar;
     read_image_info(argv[1], aSar);
     const double aDoppler = aSar.getDopplerFromPixel(0.0, 0.0, false, false);

@@ -24,6 +24,7 @@ constexpr double NV = CQORV_DOPPLER_NO_VALUE;
 constexpr int CQORV_CORRELATION_HALF_FILTER = 7;  // 15 rows
 constexpr int CQORV_OFFSET_LINES = 10000;
 constexpr int CQORV_MAX_PART_WIDTH = 49;
+constexpr int CQORV_MIN_LINES = 32;  // the median filter of stage 8 leaves no row below it
 
 bool fValid(const dcomplex& z) { return z.real() != NV && z.imag() != NV; }
 
@@ -193,7 +194,9 @@ void fqorvDopplerCorrelateLines(const dcomplex* thePrevious, const dcomplex* the
             aSum += dcomplex(b.real() * a.real() + b.imag() * a.imag(), b.imag() * a.real() - b.real() * a.imag());
             ++n;
         }
-        theRow[p] = n > theWidth / 2 ? aSum / static_cast<double>(n) : dcomplex(NV, NV);
+        // A correlation of exactly zero (lines without echo energy) carries no phase.
+        const bool aValid = n > theWidth / 2 && (aSum.real() != 0.0 || aSum.imag() != 0.0);
+        theRow[p] = aValid ? aSum / static_cast<double>(n) : dcomplex(NV, NV);
     }
 }
 
@@ -299,15 +302,16 @@ struct CGuardedSum {
     double mean(long long n) const { return mSum / static_cast<double>(n) * mDivisor; }
 };
 
-/// Stage 2: the offsets of the first 10,000 lines, stored as user keys.
-void fOffsets(CDescriptionHeader& h, CRasterFile& f, int theLines, double& theI, double& theQ, double& theImbalance,
+/// Stage 2: the I/Q offsets and the imbalance of integer samples over the first 10,000 lines,
+/// stored as user keys. False when no visited line varies: the echoes carry no energy.
+bool fOffsets(CDescriptionHeader& h, CRasterFile& f, int theLines, double& theI, double& theQ, double& theImbalance,
               int& thePercent)
 {
     theI = theQ = 0.0;
     theImbalance = 1.0;
     fdfTrace("\n\n CrossCorr ESTIMATION");
     const int aType = f.getCellType();
-    if (aType == CQORV_CELL_FLOAT_COMPLEX || aType == CQORV_CELL_FLOAT) return;
+    if (aType == CQORV_CELL_FLOAT_COMPLEX || aType == CQORV_CELL_FLOAT) return true;
     const int aCount = std::min(theLines, CQORV_OFFSET_LINES);
     std::vector<dcomplex> aLine(static_cast<std::size_t>(f.getNrOfPixels()));
     CGuardedSum sI, sQ, sI2, sQ2;
@@ -342,6 +346,7 @@ void fOffsets(CDescriptionHeader& h, CRasterFile& f, int theLines, double& theI,
     for (const auto& [aKey, aValue] : {std::pair{"OTHER_INFO_I_ESTIMATION", theI}, std::pair{"OTHER_INFO_Q_ESTIMATION", theQ},
                                        std::pair{"OTHER_INFO_IQ_INBALANCE_ESTIMATION", theImbalance}})
         fqorvSetUserKey(h, aKey, fqorvStringFormat("%lf", aValue).c_str());
+    return n > 0;
 }
 
 /// Stage 3: the correlation of every line pair, per part.
@@ -367,8 +372,16 @@ CDopplerGrid<dcomplex> fCorrelate(CRasterFile& f, int theLines, int thePartWidth
 
 }  // namespace
 
-bool fdfEstimateDoppler(const char* aPath, int aAzDegree, int aRgDegree, int aNbrAzRows, bool aExtended)
+bool fdfEstimateDoppler(const char* aPath, int aAzDegree, int aRgDegree, int aNbrAzRows, bool aExtended,
+                        std::string* theReason)
 {
+    // No estimate leaves the header as it was, so that the Doppler it held still serves a run
+    // that skips this step.
+    auto aFail = [&](const std::string& theText) {
+        fdfTrace("\nNo Doppler centroid estimate: %s\n", theText.c_str());
+        if (theReason) *theReason = theText;
+        return false;
+    };
     getAndSetPerc(-1, 0, "Doppler Estimation");
     int aPercent = 0;
     fdfTrace("\nDoppler Estimation of : %s", aPath);
@@ -400,13 +413,23 @@ bool fdfEstimateDoppler(const char* aPath, int aAzDegree, int aRgDegree, int aNb
     CRasterFile f;
     f.openRead(aParam);
     double aI = 0.0, aQ = 0.0, aImbalance = 1.0;
-    fOffsets(h, f, aLines, aI, aQ, aImbalance, aPercent);
+    if (!fOffsets(h, f, aLines, aI, aQ, aImbalance, aPercent))
+        return aFail("every echo line is constant: the raw data carry no energy");
     const CDopplerGrid<dcomplex> aCorrelation = fCorrelate(f, aLines, aPartWidth, aParts, aNull, aI, aQ, aImbalance, aPercent);
     f.close();
+    if (std::all_of(aCorrelation.mData.begin(), aCorrelation.mData.end(), [](const dcomplex& z) { return z.real() == NV; }))
+        return aFail("no pair of neighbouring lines correlates: the data carry no energy");
     const CDopplerGrid<double> aDoppler = fqorvDopplerFromCorrelation(aCorrelation, aPrf);
     if (aExtended) fdfTrace("\nthe Doppler raster of the extended estimate is not written by this build\n");
     const std::vector<std::vector<double>> aTable = fqorvDopplerRangeTable(
         aDoppler, aPartWidth, aAzDegree, aRgDegree, aNbrAzRows, r0, dr, aPrf, aSar.mStartDay, aSar.time_start);
+
+    if (aTable.empty()) {
+        if (aLines < CQORV_MIN_LINES)
+            return aFail(fqorvStringFormat("%d lines are too few: the azimuth filters need %d", aLines,
+                                           CQORV_MIN_LINES));
+        return aFail(fqorvStringFormat("no range part gave an azimuth polynomial of degree %d", aAzDegree));
+    }
 
     fdfTrace("\tWRITE IN HEADER FILE NEW DOPPLER POLYNOMIAL\n");
     const int R = static_cast<int>(aTable.size());

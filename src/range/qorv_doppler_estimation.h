@@ -3,6 +3,7 @@
 // per azimuth position, and stored as the Doppler table of the data's header.
 #pragma once
 
+#include <string>
 #include <vector>
 
 #include "qorv_complex.h"
@@ -45,5 +46,8 @@ std::vector<std::vector<double>> fqorvDopplerRangeTable(const CDopplerGrid<doubl
                                                         double theStartSeconds);
 
 /// The estimator over the raster aPath (header aPath + "_hdr", which it updates with the I/Q
-/// offsets and the table). True on success.
-bool fdfEstimateDoppler(const char* aPath, int aAzDegree, int aRgDegree, int aNbrAzRows, bool aExtended);
+/// offsets and the table). True on success. False, with the header untouched and the cause in
+/// theReason, when the data give no table row: no echo energy, too few lines for the filters, or
+/// no range part whose azimuth polynomial can be fitted.
+bool fdfEstimateDoppler(const char* aPath, int aAzDegree, int aRgDegree, int aNbrAzRows, bool aExtended,
+                        std::string* theReason = nullptr);

@@ -519,6 +519,10 @@ int qorv_pre_rc(int argc, char** argv)
     r.mPrefixBytes = aInParam.mRowPrefix;
     fContinuityLayout(*aInput, r);
 
+    // Every later step takes its Doppler centroid from this header: without one it focuses at 0 Hz.
+    if (!fqorvHasValue(*aInput, "Processing.DopCenRangeCoeff") && !fqorvHasValue(*aInput, "Processing.RangeDoppler_fref"))
+        QORV_WARNING(CQORV_WARN_65281, "Processing.DopCenRangeCoeff: the raw header holds no Doppler centroid, 0 Hz is used");
+
     std::vector<fcomplex> aTaps;
     if (r.D != 1) {
         for (const char* aKey : {"Processing.DopCenRangeCoeff", "sar_processing.AzBandWidthFraction"}) {

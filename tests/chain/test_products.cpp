@@ -152,7 +152,7 @@ std::size_t fCount(const std::string& theTrace, const std::string& theText)
     return n;
 }
 
-TEST(ChainProducts, AListOfProductsTakesTheEstimatesOfItsFirstProduct)
+TEST(ChainProducts, AListOfProductsTakesTheEstimatesOfItsFirstProductAndStopsAtAMissingOne)
 {
     qtest::DriverSandbox aBox;
     const fs::path aScene = aBox.data() / "scene";
@@ -167,14 +167,18 @@ TEST(ChainProducts, AListOfProductsTakesTheEstimatesOfItsFirstProduct)
         fs::copy_file(aScene.string() + ".sml", (aBox.data() / aName).string() + ".sml");
         aList += (aBox.data() / aName).string() + "\n";
     }
-    qtest::writeFile(aBox.data() / "scenes_foc.list", aList);
+    // A third entry names a product that is not there: the run ends with the missing file's id
+    // once the two good products are made.
+    qtest::writeFile(aBox.data() / "scenes_foc.list", aList + (aBox.data() / "c_raw").string() + "\n");
     auto aArgs = qtest::DriverSandbox::defaultArguments(aBox.data() / "scenes_foc.list", aBox.data() / "unused");
     aArgs[10] = "OK";  // the whole chain for the first product, steps 0, 2 and 5 for the second
     aArgs.push_back("0");
     const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 600);
-    ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr << qtest::readFile(aBox.workingFile());
+    ASSERT_EQ(aRun.mExitId, 261122) << aRun.mStderr << qtest::readFile(aBox.workingFile());
+    EXPECT_NE(aRun.mStatus, 0);
     EXPECT_TRUE(fs::exists(aBox.data() / "a_slc"));
     EXPECT_TRUE(fs::exists(aBox.data() / "b_slc"));
+    for (const char* aName : {"c_par.sml", "c_rc", "c_slc"}) EXPECT_FALSE(fs::exists(aBox.data() / aName)) << aName;
     const std::string aTrace = qtest::readFile(aBox.work() / "Process.trace");
     EXPECT_EQ(fCount(aTrace, "*** SAR IQ raw data azimuth spectrum"), 1u);
     EXPECT_EQ(fCount(aTrace, "*** SAR Doppler ambiguity resolver"), 1u);

@@ -5,6 +5,7 @@
 
 #include <cmath>
 #include <filesystem>
+#include <fstream>
 #include <random>
 #include <vector>
 
@@ -115,6 +116,75 @@ TEST(DopplerEstimation, StepOneFindsTheCentroidOfSimulatedErsAndEnvisatScenes)
         for (const double aLine : {1024.0, 2048.0, 3072.0})
             EXPECT_LT(std::fabs(aSar.getDopplerFromPixel(512, aLine, false, false) - aCentroid), 0.005 * aPrf) << "line " << aLine;
     }
+}
+
+/// Sets every echo sample of a simulated ERS raw file (records of a 412-byte prefix and two bytes
+/// per sample) to one code: a scene without energy whose line counters still run.
+void fBlankEchoes(const fs::path& theRaw, int theLines, int theSamples)
+{
+    std::fstream f(theRaw, std::ios::in | std::ios::out | std::ios::binary);
+    const std::string aBlank(2 * static_cast<std::size_t>(theSamples), '\x10');
+    for (int l = 0; l < theLines; ++l) {
+        f.seekp(static_cast<std::streamoff>(l) * (412 + 2 * theSamples) + 412);
+        f.write(aBlank.data(), static_cast<std::streamsize>(aBlank.size()));
+    }
+    ASSERT_TRUE(f.good());
+}
+
+TEST(DopplerEstimation, DataThatGiveNoEstimateFailStepOneAndKeepTheHeadersDoppler)
+{
+    struct Case {
+        const char* mName;
+        int mLines;
+        const char* mAzDegree;
+        bool mBlank;
+        const char* mWords;
+    };
+    for (const Case& c : {Case{"no energy", 256, "1", true, "carry no energy"},
+                          Case{"too few lines", 24, "1", false, "24 lines are too few"},
+                          Case{"unfittable degree", 256, "12", false, "azimuth polynomial of degree 12"}}) {
+        SCOPED_TRACE(c.mName);
+        qtest::DriverSandbox aBox;
+        const fs::path aRaw = aBox.data() / "scene_raw";
+        const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", std::to_string(c.mLines), "--samples", "768",
+                                                 "--scatterers", "500", "--write-doppler", "--quiet", "--out",
+                                                 aRaw.string(), "--config", aBox.etc().string()};
+        ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+        if (c.mBlank) fBlankEchoes(aRaw, c.mLines, 768);
+        auto aArgs = qtest::DriverSandbox::defaultArguments(aRaw, aBox.data() / "scene_slc");
+        aArgs[17] = "OK";  // steps 0, 1, 2 and 5
+        aArgs.push_back(c.mAzDegree);
+        const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 300);
+        EXPECT_NE(aRun.mStatus, 0);
+        EXPECT_EQ(aRun.mExitId, 261121);
+        std::string aError = qtest::readFile(aBox.workingFile().string() + "_error");
+        std::erase(aError, '\n');  // the parameter is folded over lines
+        EXPECT_NE(aError.find(c.mWords), std::string::npos) << aError;
+        EXPECT_FALSE(fs::exists(aBox.data() / "scene_rc"));
+        EXPECT_FALSE(fs::exists(aBox.data() / "scene_slc"));
+
+        qtest::InProcessEnvironment aEnv;
+        YDF_SAR aSar;
+        read_image_info(aRaw.c_str(), aSar);
+        EXPECT_FALSE(aSar.mDopplerTableEstimated);
+        const CJson aTruth = CJson::parseFile(aRaw.string() + "_truth.json");
+        EXPECT_NEAR(aSar.getDopplerFromPixel(384, 0, false, false), aTruth["doppler"]["centroid"].number(), 1e-6);
+    }
+}
+
+TEST(DopplerEstimation, AHeaderWithoutDopplerIsFocusedAtZeroWithAWarning)
+{
+    qtest::DriverSandbox aBox;
+    const fs::path aRaw = aBox.data() / "scene_raw";
+    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "256", "--samples", "768", "--targets", "grid:1x1",
+                                             "--quiet", "--out", aRaw.string(), "--config", aBox.etc().string()};
+    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+    auto aArgs = qtest::DriverSandbox::defaultArguments(aRaw, aBox.data() / "scene_slc");
+    aArgs[15] = aArgs[17] = "OK";  // steps 0, 2 and 5
+    const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 300);
+    ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr;
+    EXPECT_NE(qtest::readFile(aBox.work() / "Process.log").find("the raw header holds no Doppler centroid, 0 Hz is used"),
+              std::string::npos);
 }
 
 }  // namespace
