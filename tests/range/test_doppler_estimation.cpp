@@ -1,9 +1,11 @@
 // The Doppler centroid estimator on clutter of known spectrum (complex Gaussian noise filtered in
 // azimuth by a band centred on a chosen centroid): the table must give the centroid back, modulo
-// the PRF, anywhere in the band. Then step 1 through the driver on simulated ERS and ENVISAT scenes.
+// the PRF, anywhere in the band. Then the whole chain on simulated ERS, ENVISAT and ALOS scenes, and
+// the data that give no estimate.
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <cstdio>
 #include <filesystem>
 #include <fstream>
 #include <random>
@@ -14,6 +16,7 @@
 #include "qorv_json.h"
 #include "qorv_raster_file.h"
 #include "qorv_read_write_info.h"
+#include "qorvex_irf_check.h"
 #include "qorvex_test_support.h"
 #include "tools_raster_file_exp.h"
 
@@ -87,34 +90,92 @@ TEST(DopplerEstimation, TheTableGivesTheCentroidBackAcrossTheBand)
     }
 }
 
-TEST(DopplerEstimation, StepOneFindsTheCentroidOfSimulatedErsAndEnvisatScenes)
+TEST(DopplerEstimation, TheWholeChainFromRawDataAndHeaderAloneFindsDopplerAndVelocity)
 {
-    // Clutter beyond both ends of the image, so that the first and last lines see scatterers on
-    // both sides of the beam, as a cut from a longer pass does.
-    for (const char* aPreset : {"ers2", "envisat"}) {
-        SCOPED_TRACE(aPreset);
+    // Scenes of 4,096 lines in clutter take minutes under the sanitizers; the smaller tests cover
+    // the same code there.
+#if defined(__SANITIZE_ADDRESS__)
+    GTEST_SKIP() << "accuracy on full-size clutter scenes: release suite";
+#endif
+    // Clutter beyond both ends of the image (a margin of the aperture), so that the first and last
+    // lines see scatterers on both sides of the beam, as a cut from a longer pass does. ALOS keeps
+    // its antenna pattern to the first null: to the second, its aperture of 7,200 lines makes the
+    // scene too slow to simulate here.
+    struct Case {
+        const char* mPreset;
+        const char* mCentroid;  // "" for the preset's own
+        const char* mVelocityError;
+        const char* mExtent;
+        const char* mMargin;
+        const char* mScatterers;
+        bool mFocused;  // the velocity and the targets after the chain are held to the bar
+    };
+    for (const Case& c : {Case{"ers2", "-336", "0.01", "2", "1300", "6000", true},
+                          Case{"envisat", "330", "-0.01", "2", "1300", "6000", true},
+                          Case{"alos", "", "0.01", "1", "3700", "10000", false}}) {
+        SCOPED_TRACE(c.mPreset);
         qtest::DriverSandbox aBox;
         const fs::path aRaw = aBox.data() / "scene_raw";
-        const std::vector<std::string> aScene = {"--preset", aPreset, "--lines", "4096", "--samples", "1024", "--targets",
-                                                 "grid:2x2", "--scatterers", "6000", "--scatterer-rms", "0.5",
-                                                 "--scatterer-margin", "1300", "--quiet", "--out", aRaw.string(), "--config",
-                                                 aBox.etc().string()};
+        std::vector<std::string> aScene = {"--preset", c.mPreset, "--lines", "4096", "--samples", "1024", "--targets",
+                                           "grid:2x2", "--scatterers", c.mScatterers, "--scatterer-rms", "0.3",
+                                           "--scatterer-margin", c.mMargin, "--pattern-extent", c.mExtent,
+                                           "--velocity-error", c.mVelocityError, "--quiet", "--out", aRaw.string(),
+                                           "--config", aBox.etc().string()};
+        if (*c.mCentroid) aScene.insert(aScene.end(), {"--doppler-centroid", c.mCentroid});
         ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
         auto aArgs = qtest::DriverSandbox::defaultArguments(aRaw, aBox.data() / "scene_slc");
-        aArgs[17] = "OK";  // no autofocus: steps 0, 1, 2 and 5
-        const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 600);
+        aArgs[10] = "OK";        // steps 0, 1, 2, 4, 3, 3, 3 and 5
+        aArgs.push_back("0");    // one centroid per range position for a scene shorter than a block
+        const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 900);
         ASSERT_EQ(aRun.mStatus, 0) << aRun.mStderr << qtest::readFile(aBox.workingFile());
-        EXPECT_TRUE(fs::exists(aBox.data() / "scene_slc"));
-        EXPECT_FALSE(fs::exists(aBox.data() / "scene_azsp"));
 
         const CJson aTruth = CJson::parseFile(aRaw.string() + "_truth.json");
         const double aPrf = aTruth["radar"]["prf"].number(), aCentroid = aTruth["doppler"]["centroid"].number();
+        EXPECT_NE(qtest::readFile(aBox.work() / "Process.trace").find(", rounded: 0"), std::string::npos);
         qtest::InProcessEnvironment aEnv;
         YDF_SAR aSar;
         read_image_info(aRaw.c_str(), aSar);
         ASSERT_TRUE(aSar.mDopplerTableEstimated);
         for (const double aLine : {1024.0, 2048.0, 3072.0})
             EXPECT_LT(std::fabs(aSar.getDopplerFromPixel(512, aLine, false, false) - aCentroid), 0.005 * aPrf) << "line " << aLine;
+        CDescriptionHeader aPar({"sar_processing"});
+        ASSERT_TRUE(aPar.read((aBox.data() / "scene_par").c_str(), true));
+        const double aVelocity = aTruth["velocity"]["true_processing_velocity"].number();
+        const double aEstimated = aPar["sar_processing.Velocity"].getDouble();
+        std::printf("%s: Doppler %.2f Hz (truth %.2f), velocity %.3f m/s (truth %.3f)\n", c.mPreset,
+                    aSar.getDopplerFromPixel(512, 2048, false, false), aCentroid, aEstimated, aVelocity);
+        if (!c.mFocused) continue;  // ALOS: autofocus on this narrow swath is off by 2.4 % (docs/decisions-azimuth.md)
+        EXPECT_LT(std::fabs(aEstimated / aVelocity - 1.0), 0.002) << aEstimated << " against " << aVelocity;
+
+        // The clutter masks the sidelobes, so the targets are measured on the same scene without
+        // it, focused with the chain's estimates: the raw header takes the Doppler table and the
+        // velocity, and steps 0, 2 and 5 run.
+        const fs::path aClean = aBox.data() / "clean_raw";
+        std::vector<std::string> aCleanScene(aScene.begin(), aScene.begin() + 8);
+        aCleanScene.insert(aCleanScene.end(), {"--quiet", "--out", aClean.string(), "--config", aBox.etc().string()});
+        if (*c.mCentroid) aCleanScene.insert(aCleanScene.end(), {"--doppler-centroid", c.mCentroid});
+        ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aCleanScene, {}, aBox.data()).mStatus, 0);
+        {
+            auto aFrom = CDescriptionHeader::makeFull(), aTo = CDescriptionHeader::makeFull();
+            ASSERT_TRUE(aFrom->read((aRaw.string() + "_hdr").c_str(), true));
+            ASSERT_TRUE(aTo->read((aClean.string() + "_hdr").c_str(), true));
+            const CDescriptionField& aTable = (*aFrom)["Processing.DopCenRangeCoeff"];
+            CDescriptionField& aCopy = (*aTo)["Processing.DopCenRangeCoeff"];
+            aCopy.resize(aTable.getNbrOfRows(), aTable.getNbrOfElements());
+            for (int r = 0; r < aTable.getNbrOfRows(); ++r)
+                for (int k = 0; k < aTable.getNbrOfElements(); ++k) aCopy.setValue(r, k, aTable.getDouble(r, k));
+            (*aTo)["Processing.DopplerEstimatedFlag"].setValue("OK");
+            (*aTo)["Processing.ProcessingVelocity"].setValue(0, aEstimated);
+            ASSERT_TRUE(aTo->write((aClean.string() + "_hdr").c_str(), true, false));
+        }
+        auto aCleanArgs = qtest::DriverSandbox::defaultArguments(aClean, aBox.data() / "clean_slc");
+        aCleanArgs[15] = aCleanArgs[17] = "OK";
+        const qtest::RunResult aCleanRun = aBox.run(aBox.writeArguments(aCleanArgs, "clean.txt"), {}, 600);
+        ASSERT_EQ(aCleanRun.mStatus, 0) << aCleanRun.mStderr;
+        // The sidelobes of these squinted scenes of four targets stand up to 3 dB above the ideal
+        // with the true Doppler and velocity too (docs/decisions-azimuth.md): the estimates are held
+        // to positions and widths, and to sidelobes within 3 dB.
+        qtest::expectIdealTargets(aBox, aBox.data() / "clean_slc", aClean.string() + "_truth.json", 4, 3.0, 3.0);
     }
 }
 
