@@ -37,7 +37,7 @@ private:
     std::vector<T*> mRowTable;
 };
 
-/// The design's allocation helper: rows x cols of T, zeroed.
+/// The allocation helper of the steps: rows x cols of T, zeroed.
 template <typename T>
 CQorvMatrix<T> fdfNewMatrix(std::size_t theRows, std::size_t theCols)
 {

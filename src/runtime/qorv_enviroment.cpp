@@ -83,7 +83,7 @@ void writeBoth(const std::string& theText)
     fdfTrace("%s", theText.c_str());
 }
 
-/// Takes the line feed, a stray carriage return and the designed "backslash before the last
+/// Takes the line feed, a stray carriage return and the configured "backslash before the last
 /// character" from a configuration line.
 std::string cleanConfigLine(std::string theLine)
 {
@@ -219,7 +219,7 @@ void closeTrace()
     }
 }
 
-/// Removes the working file after a successful run, with the designed patience.
+/// Removes the working file after a successful run, retrying with a pause between tries.
 void removeWorkingFile()
 {
     for (int aTry = 1; aTry <= 30 && fqorvFileExists(gWorkingFile); ++aTry) {

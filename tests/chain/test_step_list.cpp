@@ -13,7 +13,7 @@ Steps list(bool focus, bool ml, bool par, bool azsp, bool rc, bool amb, bool af,
     return fdfBuildStepList(focus, ml, par, azsp, rc, amb, af, tiff, files);
 }
 
-TEST(StepList, FirstProductCarriesAllEstimationStepsInTheDesignedOrder)
+TEST(StepList, FirstProductCarriesAllEstimationStepsInTheChainOrder)
 {
     EXPECT_EQ(list(true, true, true, true, true, true, true, true, 1), (Steps{0, 1, 2, 4, 3, 3, 3, 5, 6, 7}));
     EXPECT_EQ(list(true, false, true, true, true, true, true, true, 1), (Steps{0, 1, 2, 4, 3, 3, 3, 5, 8}));

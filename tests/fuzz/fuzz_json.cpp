@@ -14,7 +14,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* theData, std::size_t theSiz
     try {
         aValue = CJson::parse(aText);
     } catch (const std::runtime_error&) {
-        return 0;  // a refused text is the designed end
+        return 0;  // a refused text is the intended end
     }
     const std::string aOut = aValue.dump(0);
     std::string aAgain;
