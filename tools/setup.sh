@@ -6,7 +6,7 @@ set -euo pipefail
 top=$(cd "$(dirname "$0")/.." && pwd)
 packages=(g++ cmake ninja-build pkg-config libtiff-dev libgeotiff-dev libexpat1-dev libfftw3-dev
           libmpfr-dev libgmp-dev libgtest-dev libgmock-dev libbenchmark-dev gdal-bin
-          clang libclang-rt-14-dev libomp-14-dev)
+          clang libclang-rt-14-dev libomp-14-dev snakemake)
 missing=()
 for p in "${packages[@]}"; do
   dpkg-query -W -f='${Status}' "$p" 2>/dev/null | grep -q "install ok installed" || missing+=("$p")
