@@ -33,6 +33,20 @@ void useThreads(bool theThreaded)
     fftwf_plan_with_nthreads(theThreaded ? gFftThreads : 1);
 }
 
+/// Scratch of a plan: FFTW_ESTIMATE never reads or writes the arrays it plans on, so the scratch is
+/// allocated and left untouched; its pages are never faulted in (a block plan's would be hundreds
+/// of megabytes).
+struct CPlanScratch {
+    explicit CPlanScratch(std::size_t n) : mData(fftwf_alloc_complex(n))
+    {
+        if (!mData) QORV_FATAL(CQORV_ERR_MEMORY, "FFT plan scratch");
+    }
+    ~CPlanScratch() { fftwf_free(mData); }
+    CPlanScratch(const CPlanScratch&) = delete;
+    CPlanScratch& operator=(const CPlanScratch&) = delete;
+    fftwf_complex* mData;
+};
+
 }  // namespace
 
 void fqorvFftSetThreads(int theThreads) { gFftThreads = theThreads < 1 ? 1 : theThreads; }
@@ -43,8 +57,8 @@ FftPlan1D::FftPlan1D(int theSize, FftDirection theDirection) : mSize(theSize), m
     useThreads(false);
     // Plans are made on scratch buffers with FFTW_ESTIMATE so that making one never touches the
     // caller's data; one plan serves aligned data, the other any alignment.
-    FftBuffer aScratch(static_cast<std::size_t>(theSize));
-    auto* aData = reinterpret_cast<fftwf_complex*>(aScratch.data());
+    CPlanScratch aScratch(static_cast<std::size_t>(theSize));
+    fftwf_complex* aData = aScratch.mData;
     mPlanAligned = fftwf_plan_dft_1d(theSize, aData, aData, sign(theDirection), FFTW_ESTIMATE);
     mPlanUnaligned = fftwf_plan_dft_1d(theSize, aData, aData, sign(theDirection), FFTW_ESTIMATE | FFTW_UNALIGNED);
     if (!mPlanAligned || !mPlanUnaligned) planFailure("1-D plan of size", theSize, 1);
@@ -74,8 +88,8 @@ FftPlan2D::FftPlan2D(int theRows, int theCols, FftDirection theDirection, bool t
 {
     if (theRows < 1 || theCols < 1) planFailure("2-D plan of size", theRows, theCols);
     useThreads(theThreaded);
-    FftBuffer aScratch(static_cast<std::size_t>(theRows) * theCols);
-    auto* aData = reinterpret_cast<fftwf_complex*>(aScratch.data());
+    CPlanScratch aScratch(static_cast<std::size_t>(theRows) * theCols);
+    fftwf_complex* aData = aScratch.mData;
     mPlan = fftwf_plan_dft_2d(theRows, theCols, aData, aData, sign(theDirection), FFTW_ESTIMATE | FFTW_UNALIGNED);
     useThreads(false);
     if (!mPlan) planFailure("2-D plan of size", theRows, theCols);
@@ -97,8 +111,8 @@ FftPlanColumns::FftPlanColumns(int theRows, int theCols, FftDirection theDirecti
 {
     if (theRows < 1 || theCols < 1) planFailure("column plan of size", theRows, theCols);
     useThreads(theThreaded);
-    FftBuffer aScratch(static_cast<std::size_t>(theRows) * theCols);
-    auto* aData = reinterpret_cast<fftwf_complex*>(aScratch.data());
+    CPlanScratch aScratch(static_cast<std::size_t>(theRows) * theCols);
+    fftwf_complex* aData = aScratch.mData;
     int aN[1] = {theRows};
     // Column c starts at element c; consecutive points of a column are one row apart.
     mPlan = fftwf_plan_many_dft(1, aN, theCols, aData, nullptr, theCols, 1, aData, nullptr, theCols, 1,
