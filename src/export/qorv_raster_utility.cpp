@@ -154,7 +154,10 @@ void fqorvNormalizeRaster(const char* theRaster, const char* theHeader, double a
             fqorvWriteLine(aFile, aLine.data(), r);
             const int aNew = 50 + static_cast<int>(49LL * r / aLines);
             if (aNew != aPercent) {
-                getAndSetPerc(aPercent, aNew, nullptr);
+                if (!getAndSetPerc(aPercent, aNew, nullptr)) {
+                    fdfTrace("\n EXECUTION INTERRUPTED BY OPERATOR\n");
+                    QORV_FATAL(CQORV_ERR_OPERATOR_STOP, "");
+                }
                 aPercent = aNew;
             }
         }
