@@ -2,6 +2,7 @@
 
 #include <fcntl.h>
 #include <signal.h>
+#include <sys/file.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -17,6 +18,7 @@ namespace {
 constexpr long kMissingFile = 261122;   // the focuser's id of a missing input
 constexpr long kCreateFile = 261123;    // the focuser's id of an output that can't be created
 constexpr long kOperatorStop = 326400;
+constexpr std::size_t kErrorLineWidth = 48;  // the result block breaks longer parameters at this width
 
 std::string readText(const fs::path& thePath)
 {
@@ -76,6 +78,14 @@ Scene::Scene(const Options& theOptions, const fs::path& theRaw, fs::path theDriv
     mArgs = mWork / "arguments.txt";
 }
 
+Scene::~Scene() { unlock(); }
+
+void Scene::unlock()
+{
+    if (mLock >= 0) close(mLock);
+    mLock = -1;
+}
+
 void Scene::fail(long theId, const std::string& theText)
 {
     mResult.mState = SceneState::Failed;
@@ -92,11 +102,21 @@ bool Scene::prepare()
         return false;
     }
     fs::create_directories(mWork, e);
-    if (e || !writeText(mWork / ".write-test", "")) {
+    const fs::path aLock = mWork / "lock";
+    mLock = e ? -1 : open(aLock.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0644);
+    if (mLock < 0) {
         fail(kCreateFile, "the output directory " + mOptions.mOut.string() + " cannot be written");
         return false;
     }
-    fs::remove(mWork / ".write-test", e);
+    // One run per scene and output directory: a second run (another qorvex-focus, another job of a
+    // workflow) would overwrite the first one's products under it. The driver inherits the lock,
+    // so it holds while the driver writes even if the front end is killed.
+    if (flock(mLock, LOCK_EX | LOCK_NB) != 0) {
+        close(mLock);
+        mLock = -1;
+        fail(kCreateFile, "another run is focusing " + mBase + " into " + mOptions.mOut.string());
+        return false;
+    }
     // The chain writes into the raw product's header (PRF changes, the Doppler table): it runs on a
     // copy beside a link to the raster, so that the archive is only read.
     const fs::path aLocalHeader = mLocalRaw.string() + ".sml";
@@ -133,6 +153,7 @@ void Scene::start()
         setenv("QORVEX_INIT_DIR", mConfig.c_str(), 1);
         setenv("QORVEX_WORKING_DIR", (mWork.string() + "/").c_str(), 1);
         setenv("QORVEX_WORKING_FILE", mWorkingFile.c_str(), 1);
+        if (mLock >= 0) fcntl(mLock, F_SETFD, 0);  // the driver holds the scene's lock with it
         if (chdir(mWork.c_str()) != 0) _exit(127);
         execl(mDriver.c_str(), mDriver.c_str(), mArgs.c_str(), static_cast<char*>(nullptr));
         _exit(127);
@@ -205,21 +226,30 @@ void Scene::finish(int theStatus)
         // the parameters.
         std::istringstream aBlock(readText(mWorkingFile.string() + "_error"));
         std::string aLine, aText;
-        for (int n = 0; std::getline(aBlock, aLine); ++n)
-            if (n >= 2 && aLine.find_first_not_of(' ') != std::string::npos) aText += (aText.empty() ? "" : " / ") + aLine;
+        bool aBroken = false;  // the previous line was a long parameter broken at the block's width
+        for (int n = 0; std::getline(aBlock, aLine); ++n) {
+            if (n >= 2 && aLine.find_first_not_of(' ') != std::string::npos)
+                aText += (aText.empty() || aBroken ? "" : " / ") + aLine;
+            aBroken = aLine.size() == kErrorLineWidth;
+        }
         if (mKilled) aText = "ended at once by a second interrupt";
         else if (aId == kOperatorStop) aText = "stopped by the operator";
         else if (aText.empty()) aText = "the focuser ended with status " + std::to_string(mResult.mExitStatus);
         fail(aId > 0 ? aId : 0, aText);
         if (mStopRequested || mKilled || aId == kOperatorStop) mResult.mState = SceneState::Stopped;
-        // What the run was writing stands under "_tmp" names: nothing of it is kept.
+        // What the run was writing stands under "NAME_PRODUCT_tmp" names: nothing of it is kept.
+        // A product name holds no "_", so "a_b_slc_tmp" of a scene "a_b" is not taken for "a"'s.
         std::error_code e;
         for (const auto& d : fs::directory_iterator(mOptions.mOut, e)) {
             const std::string n = d.path().filename().string();
-            if (n.rfind(mBase + "_", 0) == 0 && n.find("_tmp") != std::string::npos) fs::remove(d.path(), e);
+            const std::size_t t = n.find("_tmp", mBase.size());
+            if (n.rfind(mBase + "_", 0) == 0 && t != std::string::npos &&
+                n.find('_', mBase.size() + 1) == t)
+                fs::remove(d.path(), e);
         }
     }
     collect();
+    unlock();
 }
 
 void Scene::collect()

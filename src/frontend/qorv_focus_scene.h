@@ -43,6 +43,9 @@ class Scene {
 public:
     /// theDriver: the qorvex program; theConfig: the directory of its configuration.
     Scene(const Options& theOptions, const fs::path& theRaw, fs::path theDriver, fs::path theConfig);
+    ~Scene();
+    Scene(const Scene&) = delete;
+    Scene& operator=(const Scene&) = delete;
 
     /// Makes the scene's place in the output directory; false (the scene has failed, with its
     /// words and id) when the raw file has no header or the directory cannot be written.
@@ -70,12 +73,14 @@ private:
     void fail(long theId, const std::string& theText);
     void finish(int theStatus);
     void collect();
+    void unlock();
 
     const Options& mOptions;
     fs::path mRaw, mDriver, mConfig;
     std::string mBase;
     fs::path mRoot, mLocalRaw, mWork, mWorkingFile, mArgs;
     pid_t mPid = -1;
+    int mLock = -1;  // the scene's lock file in its working directory, held from prepare to the end
     bool mStopRequested = false, mKilled = false;
     std::string mTitle;
     int mPercent = 0;

@@ -57,6 +57,18 @@ TEST(FocusFrontEnd, OptionsBecomeTheArgumentsFileAndTheArchiveIsOnlyRead)
         kFocus, {"--out", (aArchive / "scene_raw.sml" / "out").string(), (aArchive / "scene_raw").string()}, {}, aDir.path());
     EXPECT_EQ(aReadOnly.mStatus, 1);
     EXPECT_NE(aReadOnly.mStdout.find("failure 261123: the output directory"), std::string::npos) << aReadOnly.mStdout;
+    // A disk that fills during the run (a file size limit, with its signal ignored as a full disk
+    // gives no signal) fails the scene with the write id and leaves nothing half-written.
+    const fs::path aFull = aDir / "full";
+    const qtest::RunResult aDiskFull = qtest::runProgram(
+        "/bin/sh", {"-c", "trap '' XFSZ; ulimit -f 2048; exec " + kFocus.string() + " --out " + shellQuote(aFull.string()) +
+                              " " + shellQuote((aArchive / "scene_raw").string())},
+        {}, aDir.path(), 300);
+    EXPECT_EQ(aDiskFull.mStatus, 1);
+    EXPECT_NE(aDiskFull.mStdout.find("failure 261124: "), std::string::npos) << aDiskFull.mStdout;
+    EXPECT_NE(aDiskFull.mStdout.find("on file " + (aFull / "scene_rc_tmp").string()), std::string::npos) << aDiskFull.mStdout;
+    EXPECT_FALSE(fs::exists(aFull / "scene_rc"));
+    EXPECT_FALSE(fs::exists(aFull / "scene_rc_tmp"));
 
     const qtest::RunResult r = qtest::runProgram(
         kFocus, {"--out", aOut.string(), "--looks", "2x4", "--no-tiff", "--keep", "--skip", "1", "--skip", "3", "--no-ambiguity",
@@ -132,6 +144,8 @@ TEST(FocusFrontEnd, CtrlCStopsTheRunThroughTheWorkingFileAndLeavesNoProduct)
         "setsid " + kFocus.string() + " --out out --skip 1 --skip 3 --no-ambiguity in/long_raw > progress.txt 2>&1 &\n"
         "pid=$!\n"
         "for i in $(seq 600); do grep -q 'omega/k' progress.txt && break; sleep 0.1; done\n"
+        // A second run on the same scene and output directory is refused while the first one works.
+        + kFocus.string() + " --out out in/long_raw > second.txt 2>&1; echo $? >> second.txt\n"
         "kill -INT -$pid\n"
         "wait $pid\n"
         "echo $? > status.txt\n";
@@ -141,6 +155,9 @@ TEST(FocusFrontEnd, CtrlCStopsTheRunThroughTheWorkingFileAndLeavesNoProduct)
     EXPECT_EQ(qtest::readFile(aDir / "status.txt"), "1\n") << aProgress;
     EXPECT_NE(aProgress.find("long: stopped"), std::string::npos) << aProgress;
     EXPECT_NE(aProgress.find("stopped by the operator"), std::string::npos) << aProgress;
+    const std::string aSecond = qtest::readFile(aDir / "second.txt");
+    EXPECT_NE(aSecond.find("failure 261123: another run is focusing long into"), std::string::npos) << aSecond;
+    EXPECT_EQ(aSecond.substr(aSecond.size() - 2), "1\n") << aSecond;
     for (const auto& f : fs::directory_iterator(aDir / "out")) {
         const std::string n = f.path().filename().string();
         EXPECT_EQ(n.find("_tmp"), std::string::npos) << n;
