@@ -235,7 +235,7 @@ void Scene::finish(int theStatus)
         if (mKilled) aText = "ended at once by a second interrupt";
         else if (aId == kOperatorStop) aText = "stopped by the operator";
         else if (aText.empty()) aText = "the focuser ended with status " + std::to_string(mResult.mExitStatus);
-        fail(aId > 0 ? aId : 0, aText);
+        fail(aId > 0 ? aId : (mKilled ? kOperatorStop : 0), aText);
         if (mStopRequested || mKilled || aId == kOperatorStop) mResult.mState = SceneState::Stopped;
         // What the run was writing stands under "NAME_PRODUCT_tmp" names: nothing of it is kept.
         // A product name holds no "_", so "a_b_slc_tmp" of a scene "a_b" is not taken for "a"'s.

@@ -222,8 +222,13 @@ int main(int argc, char** argv)
         if (gInterrupts > aHandled) {
             aHandled = gInterrupts;
             for (auto& s : aScenes) {
-                if (aHandled == 1) s->requestStop();
-                else s->kill();
+                if (aHandled == 1) {
+                    s->requestStop();
+                } else if (s->result().mState == SceneState::Running) {
+                    s->kill();
+                    --aRunning;
+                    aProgress.ended(*s);
+                }
             }
             if (aHandled == 1) std::fprintf(stderr, "qorvex-focus: stopping (Ctrl-C again ends at once)\n");
         }

@@ -139,30 +139,39 @@ TEST(FocusFrontEnd, CtrlCStopsTheRunThroughTheWorkingFileAndLeavesNoProduct)
     qtest::TempDir aDir;
     simulate(aDir / "in", "long", "16384");
     // The front end leads a process group of its own; the interrupt goes to the group once the
-    // focusing step has begun, as Ctrl-C at a terminal would.
-    const std::string aScript =
-        "setsid " + kFocus.string() + " --out out --skip 1 --skip 3 --no-ambiguity in/long_raw > progress.txt 2>&1 &\n"
-        "pid=$!\n"
-        "for i in $(seq 600); do grep -q 'omega/k' progress.txt && break; sleep 0.1; done\n"
-        // A second run on the same scene and output directory is refused while the first one works.
-        + kFocus.string() + " --out out in/long_raw > second.txt 2>&1; echo $? >> second.txt\n"
-        "kill -INT -$pid\n"
-        "wait $pid\n"
-        "echo $? > status.txt\n";
-    const qtest::RunResult r = qtest::runProgram("/bin/sh", {"-c", aScript}, {}, aDir.path(), 600);
-    ASSERT_EQ(r.mStatus, 0) << r.mStderr;
-    const std::string aProgress = qtest::readFile(aDir / "progress.txt");
-    EXPECT_EQ(qtest::readFile(aDir / "status.txt"), "1\n") << aProgress;
+    // focusing step has begun, as Ctrl-C at a terminal would. theSecondRun runs meanwhile.
+    const auto interrupt = [&](const std::string& theOut, const std::string& theSecondRun, const std::string& theKill) {
+        const std::string aScript =
+            "setsid " + kFocus.string() + " --out " + theOut + " --skip 1 --skip 3 --no-ambiguity in/long_raw > progress.txt 2>&1 &\n"
+            "pid=$!\n"
+            "for i in $(seq 600); do grep -q 'omega/k' progress.txt && break; sleep 0.1; done\n" +
+            theSecondRun + "\n" + theKill + "\nwait $pid\necho $? >> progress.txt\n";
+        const qtest::RunResult r = qtest::runProgram("/bin/sh", {"-c", aScript}, {}, aDir.path(), 600);
+        EXPECT_EQ(r.mStatus, 0) << r.mStderr;
+        for (const auto& f : fs::directory_iterator(aDir / theOut)) {
+            const std::string n = f.path().filename().string();
+            EXPECT_EQ(n.find("_tmp"), std::string::npos) << n;
+            EXPECT_NE(n, "long_slc");
+        }
+        return qtest::readFile(aDir / "progress.txt");
+    };
+    // One Ctrl-C: the driver stops through the working file. A second run on the same scene and
+    // output directory is refused while the first one works.
+    std::string aProgress = interrupt("out", kFocus.string() + " --out out in/long_raw > second.txt 2>&1; echo $? >> second.txt",
+                                      "kill -INT -$pid");
+    EXPECT_EQ(aProgress.substr(aProgress.size() - 2), "1\n") << aProgress;
     EXPECT_NE(aProgress.find("long: stopped"), std::string::npos) << aProgress;
     EXPECT_NE(aProgress.find("stopped by the operator"), std::string::npos) << aProgress;
     const std::string aSecond = qtest::readFile(aDir / "second.txt");
     EXPECT_NE(aSecond.find("failure 261123: another run is focusing long into"), std::string::npos) << aSecond;
     EXPECT_EQ(aSecond.substr(aSecond.size() - 2), "1\n") << aSecond;
-    for (const auto& f : fs::directory_iterator(aDir / "out")) {
-        const std::string n = f.path().filename().string();
-        EXPECT_EQ(n.find("_tmp"), std::string::npos) << n;
-        EXPECT_NE(n, "long_slc");
-    }
+    // Two: the driver's process group ends at once, even when the driver does not answer (here
+    // held stopped, so that it cannot end on the first).
+    aProgress = interrupt("out2",
+                          "for p in /proc/[0-9]*; do grep -qs 'long[.]qorvex/arguments' $p/cmdline && kill -STOP ${p#/proc/}; done",
+                          "kill -INT -$pid; sleep 0.3; kill -INT -$pid");
+    EXPECT_EQ(aProgress.substr(aProgress.size() - 2), "1\n") << aProgress;
+    EXPECT_NE(aProgress.find("failure 326400: ended at once by a second interrupt"), std::string::npos) << aProgress;
 }
 
 TEST(FocusFrontEnd, TheWorkflowFocusesEveryRawProductOfADirectory)
