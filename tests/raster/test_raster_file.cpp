@@ -1,5 +1,4 @@
 // The flat raster file: layouts, byte orders, seeks beyond 2 GB, cache, completion and refusals.
-#include <cmath>
 #include <csignal>
 #include <cstring>
 #include <fcntl.h>
@@ -11,7 +10,6 @@
 #include <unistd.h>
 
 #include <gtest/gtest.h>
-#include <tiffio.h>
 
 #include "qorv_errors.h"
 #include "qorvex_test_support.h"
@@ -468,35 +466,4 @@ TEST_F(RasterFileTest, WriteFailureCutsToWholeRecords)
     const long long aSize = fileSize(aName);
     EXPECT_EQ(aSize % aRecord, 0);
     EXPECT_LE(aSize, 64LL * aRecord);
-}
-
-// A TIFF opened for writing refuses flat reads; closing it writes its header once and leaves a
-// file that opens for reading.
-TEST_F(RasterFileTest, TiffStatesOpenAndClose)
-{
-    static int sHeaderWrites = 0;
-    QorvTiffHeaderWriter aOld = fqorvSetTiffHeaderWriter([](CRasterFile&) { ++sHeaderWrites; });
-    const CRasterFileParam p = param(path("picture.tif"), 2, 3, CQORV_CELL_UNSIGNED_BYTE);
-    CRasterFile t;
-    t.openTiff(CQORV_RF_OPEN_TIFF_WRITE, p);
-    TIFF* aTiff = static_cast<TIFF*>(t.tiffHandle());
-    ASSERT_NE(aTiff, nullptr);
-    TIFFSetField(aTiff, TIFFTAG_IMAGEWIDTH, 3);
-    TIFFSetField(aTiff, TIFFTAG_IMAGELENGTH, 2);
-    TIFFSetField(aTiff, TIFFTAG_BITSPERSAMPLE, 8);
-    TIFFSetField(aTiff, TIFFTAG_SAMPLESPERPIXEL, 1);
-    uint8_t aRow[3] = {1, 2, 3};
-    for (int r = 0; r < 2; ++r) ASSERT_EQ(TIFFWriteScanline(aTiff, aRow, r, 0), 1);
-    std::vector<float> aLine(3);
-    EXPECT_QORV_FAILURE(t.readLines(0, 1, 0, 2, aLine.data()), CQORV_ERR_RASTER_READ);
-    mEnv.reinit();
-    t.close(true);
-    EXPECT_EQ(sHeaderWrites, 1);
-
-    t.openTiff(CQORV_RF_OPEN_TIFF_READ, p);
-    uint32_t aWidth = 0;
-    TIFFGetField(static_cast<TIFF*>(t.tiffHandle()), TIFFTAG_IMAGEWIDTH, &aWidth);
-    EXPECT_EQ(aWidth, 3u);
-    t.close();
-    fqorvSetTiffHeaderWriter(aOld);
 }
