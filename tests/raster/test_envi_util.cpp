@@ -176,30 +176,24 @@ TEST_F(EnviTest, GeocodedAndUnitLines)
         << aText;
 }
 
-namespace {
-
-qtest::ConfigOptions withoutDescriptionFile()
-{
-    static qtest::TempDir sDes("qorvex-des");
-    for (const char* aName : {"qorv_errors_catalog.des", "qorv_warnings_catalog.des"})
-        qtest::fs::copy_file(qtest::sourceShareDir() / "des" / aName, sDes.path() / aName,
-                             qtest::fs::copy_options::overwrite_existing);
-    qtest::ConfigOptions aOptions;
-    aOptions.mDesDir = sDes.path();
-    return aOptions;
-}
-
+// Without the ENVI description file the product header is written and the ENVI one is not.
 class EnviNoDescriptionTest : public EnviTest {
 protected:
+    static qtest::ConfigOptions withoutDescriptionFile()
+    {
+        static qtest::TempDir sDes("qorvex-des");
+        for (const char* aName : {"qorv_errors_catalog.des", "qorv_warnings_catalog.des"})
+            qtest::fs::copy_file(qtest::sourceShareDir() / "des" / aName, sDes.path() / aName, qtest::fs::copy_options::overwrite_existing);
+        qtest::ConfigOptions aOptions;
+        aOptions.mDesDir = sDes.path();
+        return aOptions;
+    }
     EnviNoDescriptionTest() : EnviTest(withoutDescriptionFile()) {}
 };
 
-}  // namespace
-
 TEST_F(EnviNoDescriptionTest, MissingDescriptionFileWritesNothing)
 {
-    std::unique_ptr<CDescriptionHeader> h = rasterHeader(2, 2, "FLOAT", "LSBF", 0.0);
-    ASSERT_TRUE(h->write(path("plain_hdr").c_str(), true, false));
+    ASSERT_TRUE(rasterHeader(2, 2, "FLOAT", "LSBF", 0.0)->write(path("plain_hdr").c_str(), true, false));
     EXPECT_TRUE(qtest::fs::exists(path("plain.sml")));
     EXPECT_FALSE(qtest::fs::exists(path("plain.hdr")));
     EXPECT_NE(mEnv.trace().find("SEC_FILE_NOT_FOUND : "), std::string::npos);
