@@ -1,8 +1,8 @@
 // The flat raster file: layouts, byte orders, seeks beyond 2 GB, cache, completion and refusals.
-#include <cmath>
 #include <csignal>
 #include <cstring>
 #include <fcntl.h>
+#include <functional>
 #include <sys/resource.h>
 #include <sys/stat.h>
 #include <sys/types.h>
@@ -10,7 +10,6 @@
 #include <unistd.h>
 
 #include <gtest/gtest.h>
-#include <tiffio.h>
 
 #include "qorv_errors.h"
 #include "qorvex_test_support.h"
@@ -44,73 +43,47 @@ std::vector<uint8_t> pattern(std::size_t theCount, int theSeed = 3)
 
 }  // namespace
 
+// The row and column limits are inclusive; one beyond them, or no lines at all, is refused.
 TEST_F(RasterFileTest, GeometryBoundsAreInclusive)
 {
     const std::string aName = path("bounds");
     writeBytes(aName, {});
+    const int aMax = CQORV_RASTER_FILE_MAX_ROWS;
     CRasterFile f;
-    f.openRead(param(aName, CQORV_RASTER_FILE_MAX_ROWS, CQORV_RASTER_FILE_MAX_ROWS, CQORV_CELL_UNSIGNED_BYTE));
-    EXPECT_EQ(f.getStatus(), CQORV_RF_OPEN_READ);
+    f.openRead(param(aName, aMax, aMax, CQORV_CELL_UNSIGNED_BYTE));
     f.close();
-    EXPECT_EQ(f.getStatus(), CQORV_RF_CLOSE);
-
-    EXPECT_QORV_FAILURE(f.openRead(param(aName, CQORV_RASTER_FILE_MAX_ROWS + 1, 1, CQORV_CELL_UNSIGNED_BYTE)),
-                        CQORV_ERR_RASTER_ACCESS);
-    EXPECT_NE(mEnv.trace().find("mNrOfLinesPerImage = 900001"), std::string::npos);
-    mEnv.reinit();
-    EXPECT_QORV_FAILURE(f.openRead(param(aName, 1, CQORV_RASTER_FILE_MAX_ROWS + 1, CQORV_CELL_UNSIGNED_BYTE)),
-                        CQORV_ERR_RASTER_ACCESS);
-    EXPECT_NE(mEnv.trace().find("mNrOfPixelsPerLine = 900001"), std::string::npos);
-    EXPECT_NE(mEnv.trace().find("CQORV_RASTER_FILE_MAX_ROWS = 900000"), std::string::npos);
-    mEnv.reinit();
-    EXPECT_QORV_FAILURE(f.openRead(param(aName, 0, 1, CQORV_CELL_UNSIGNED_BYTE)), CQORV_ERR_RASTER_ACCESS);
+    for (auto [aLines, aPixels] : {std::pair{aMax + 1, 1}, std::pair{1, aMax + 1}, std::pair{0, 1}}) {
+        mEnv.reinit();
+        EXPECT_QORV_FAILURE(f.openRead(param(aName, aLines, aPixels, CQORV_CELL_UNSIGNED_BYTE)), CQORV_ERR_RASTER_ACCESS);
+    }
 }
 
 // Every cell type in both byte orders: the file holds each component in the asked order, a read
 // gives the native values back, and one-byte components never swap.
 TEST_F(RasterFileTest, EveryCellTypeInBothByteOrders)
 {
+    const int aLines = 3, aPixels = 13;
     for (int aType = 0; aType < CQORV_CELL_TYPE_NBR; ++aType) {
         for (bool aMSBF : {false, true}) {
             SCOPED_TRACE(std::string(fqorvCellTypeName(aType)) + (aMSBF ? " MSBF" : " LSBF"));
-            const int aLines = 3, aPixels = 13;
             const std::string aName = path("cells_" + std::to_string(aType) + (aMSBF ? "_m" : "_l"));
-            CRasterFile w;
-            w.openWrite(CQORV_RF_OPEN_WRITE, param(aName, aLines, aPixels, aType, aMSBF));
-            const int aGroup = w.getBytesPerPixel() / w.getDataNbr();
-            EXPECT_EQ(w.isSwapped(), aGroup >= 2 && aMSBF != fqorvMachineIsMSBF());
-            const std::vector<uint8_t> aNative = pattern(static_cast<std::size_t>(w.getLineBytes()) * aLines, aType);
+            const CRasterFileParam p = param(aName, aLines, aPixels, aType, aMSBF);
+            CRasterFile f;
+            f.openWrite(CQORV_RF_OPEN_WRITE, p);
+            const int aGroup = f.getBytesPerPixel() / f.getDataNbr();
+            const std::vector<uint8_t> aNative = pattern(static_cast<std::size_t>(f.getLineBytes()) * aLines, aType);
             std::vector<uint8_t> aBuffer = aNative;
-            w.writeLines(0, aLines, aBuffer.data());
-            w.close();
+            f.writeLines(0, aLines, aBuffer.data());
+            f.close();
+            EXPECT_EQ(fileBytes(aName), aMSBF != fqorvMachineIsMSBF() ? swapped(aNative, aGroup) : aNative);
 
-            const bool aOther = aMSBF != fqorvMachineIsMSBF();
-            EXPECT_EQ(fileBytes(aName), aOther ? swapped(aNative, aGroup) : aNative);
-
-            CRasterFile r;
-            r.openRead(param(aName, aLines, aPixels, aType, aMSBF));
+            f.openRead(p);
             std::vector<uint8_t> aBack(aNative.size());
-            r.readLines(0, aLines, 0, aPixels - 1, aBack.data());
+            f.readLines(0, aLines, 0, aPixels - 1, aBack.data());
             EXPECT_EQ(aBack, aNative);
-            r.close();
+            f.close();
         }
     }
-}
-
-TEST_F(RasterFileTest, ComplexCellsSwapComponentByComponent)
-{
-    const std::string aName = path("fc_msbf");
-    CRasterFile w;
-    const bool aOther = !fqorvMachineIsMSBF();
-    w.openWrite(CQORV_RF_OPEN_WRITE, param(aName, 1, 1, CQORV_CELL_FLOAT_COMPLEX, aOther));
-    fcomplex aCell(1.0f, -2.0f);
-    w.writeLines(0, 1, &aCell);
-    w.close();
-    const std::vector<uint8_t> aFile = fileBytes(aName);
-    ASSERT_EQ(aFile.size(), 8u);
-    float aRe = 1.0f, aIm = -2.0f;
-    std::vector<uint8_t> aExpected = swapped(asBytes(std::vector<float>{aRe, aIm}), 4);
-    EXPECT_EQ(aFile, aExpected);  // each 4-byte part reversed on its own, parts in place
 }
 
 // Reads clamp a start row outside the image to the nearest line; without prefix and suffix a read
@@ -125,102 +98,80 @@ TEST_F(RasterFileTest, ClampingAndWholeRecordRoad)
 
     CRasterFile f;
     f.openRead(param(aName, aLines, aPixels, CQORV_CELL_FLOAT));
-    std::vector<float> aLine(aPixels);
-    f.readLines(10, 1, 0, aPixels - 1, aLine.data());
-    EXPECT_EQ(aLine[0], 18.0f);
-    EXPECT_NE(mEnv.trace().find("Requested line 10 is outside the image!\n"), std::string::npos);
-    f.readLines(-3, 1, 0, aPixels - 1, aLine.data());
-    EXPECT_EQ(aLine[0], 0.0f);
-
     std::vector<float> aTwo(2 * aPixels, -1.0f);
+    f.readLines(10, 1, 0, aPixels - 1, aTwo.data());
+    EXPECT_EQ(aTwo[0], 18.0f);
+    f.readLines(-3, 1, 0, aPixels - 1, aTwo.data());
+    EXPECT_EQ(aTwo[0], 0.0f);
     f.readLines(0, 2, 0, 2, aTwo.data());
     EXPECT_EQ(aTwo, std::vector<float>(aAll.begin(), aAll.begin() + 2 * aPixels));
     f.close();
 
     // The same lines behind a prefix: the columns come packed, three per line.
-    const std::string aPrefixed = path("clamp_prefix");
     std::vector<uint8_t> aBytes;
     for (int l = 0; l < aLines; ++l) {
         aBytes.insert(aBytes.end(), {0xAA, 0xBB});
         const std::vector<uint8_t> aRow = asBytes(std::vector<float>(aAll.begin() + l * aPixels, aAll.begin() + (l + 1) * aPixels));
         aBytes.insert(aBytes.end(), aRow.begin(), aRow.end());
     }
-    writeBytes(aPrefixed, aBytes);
-    CRasterFileParam p = param(aPrefixed, aLines, aPixels, CQORV_CELL_FLOAT);
+    writeBytes(aName, aBytes);
+    CRasterFileParam p = param(aName, aLines, aPixels, CQORV_CELL_FLOAT);
     p.mRowPrefix = 2;
     f.openRead(p);
     std::vector<float> aPacked(6, -1.0f);
     f.readLines(1, 2, 1, 3, aPacked.data());
     EXPECT_EQ(aPacked, (std::vector<float>{7, 8, 9, 13, 14, 15}));
-    uint8_t aPrefix[2] = {0, 0};
-    f.readRowPrefix(3, aPrefix);
-    EXPECT_EQ(aPrefix[0], 0xAA);
-    EXPECT_EQ(aPrefix[1], 0xBB);
+    std::vector<uint8_t> aPrefix(2, 0);
+    f.readRowPrefix(3, aPrefix.data());
+    EXPECT_EQ(aPrefix, (std::vector<uint8_t>{0xAA, 0xBB}));
     f.close();
 }
 
-// Header gap, prefix and suffix in write and update status, in big-endian order.
+// Header gap, prefix and suffix around big-endian cells, byte for byte; an update in place of two
+// columns touches their bytes only, and reading on after it still works.
 TEST_F(RasterFileTest, PrefixSuffixAndHeaderGap)
 {
     const std::string aName = path("prefixed");
-    const int aLines = 3, aPixels = 4, aHeader = 7, aPrefixLen = 3, aSuffix = 2;
+    const int aLines = 3, aPixels = 4, aHeader = 7, aRecord = 3 + aPixels * 2 + 2;
     CRasterFileParam p = param(aName, aLines, aPixels, CQORV_CELL_SHORT, true);
     p.mHeaderLen = aHeader;
-    p.mRowPrefix = aPrefixLen;
-    p.mRowSuffix = aSuffix;
+    p.mRowPrefix = 3;
+    p.mRowSuffix = 2;
+    auto aCells = [](int l) { return std::vector<int16_t>{int16_t(l * 100 + 1), int16_t(l * 100 + 2), int16_t(-l - 1), 0x1234}; };
 
-    CRasterFile w;
-    w.openWrite(CQORV_RF_OPEN_WRITE, p);
-    EXPECT_EQ(w.getRecordLen(), aPrefixLen + aPixels * 2 + aSuffix);
+    CRasterFile f;
+    f.openWrite(CQORV_RF_OPEN_WRITE, p);
     const uint8_t aTag[3] = {'A', 'B', 'C'};
-    w.setRowPrefix(aTag);
+    f.setRowPrefix(aTag);
+    for (int l = 0; l < aLines; ++l) f.writeLines(l, 1, aCells(l).data());
+    f.close();
+    std::vector<uint8_t> aExpected(aHeader, 0);
     for (int l = 0; l < aLines; ++l) {
-        std::vector<int16_t> aRow = {int16_t(l * 100 + 1), int16_t(l * 100 + 2), int16_t(-l - 1), int16_t(0x1234)};
-        w.writeLines(l, 1, aRow.data());
+        aExpected.insert(aExpected.end(), {'A', 'B', 'C'});
+        for (int16_t v : aCells(l)) aExpected.insert(aExpected.end(), {uint8_t(uint16_t(v) >> 8), uint8_t(v & 0xff)});
+        aExpected.insert(aExpected.end(), {0, 0});
     }
-    w.close();
+    EXPECT_EQ(fileBytes(aName), aExpected);
 
-    const std::vector<uint8_t> aFile = fileBytes(aName);
-    const int aRecord = aPrefixLen + aPixels * 2 + aSuffix;
-    ASSERT_EQ(aFile.size(), static_cast<std::size_t>(aHeader + aLines * aRecord));
-    for (int i = 0; i < aHeader; ++i) EXPECT_EQ(aFile[i], 0);
-    for (int l = 0; l < aLines; ++l) {
-        const uint8_t* r = aFile.data() + aHeader + l * aRecord;
-        EXPECT_EQ(std::string(reinterpret_cast<const char*>(r), 3), "ABC");
-        const int16_t aFirst = static_cast<int16_t>(l * 100 + 1);
-        EXPECT_EQ(r[3], static_cast<uint8_t>(aFirst >> 8));  // big-endian in the file
-        EXPECT_EQ(r[4], static_cast<uint8_t>(aFirst & 0xff));
-        EXPECT_EQ(r[9], 0x12);
-        EXPECT_EQ(r[10], 0x34);
-        EXPECT_EQ(r[aRecord - 1], 0);
-    }
-
-    // Update two columns of line 1 in place: prefix, other columns and suffix stay.
-    CRasterFile u;
-    u.openWrite(CQORV_RF_OPEN_READ_WRITE, p);
-    std::vector<int16_t> aTwo = {int16_t(-7), int16_t(77)};
-    u.writeLines(1, 1, aTwo.data(), 1, 2);
+    f.openWrite(CQORV_RF_OPEN_READ_WRITE, p);
+    std::vector<int16_t> aTwo = {-7, 77};
+    f.writeLines(1, 1, aTwo.data(), 1, 2);
     std::vector<int16_t> aBack(aPixels);
-    u.readLines(1, 1, 0, aPixels - 1, aBack.data());
+    f.readLines(1, 1, 0, aPixels - 1, aBack.data());
     EXPECT_EQ(aBack, (std::vector<int16_t>{101, -7, 77, 0x1234}));
-    u.readLines(2, 1, 0, aPixels - 1, aBack.data());  // reading on after the update
-    EXPECT_EQ(aBack, (std::vector<int16_t>{201, 202, -3, 0x1234}));
-    u.close();
-    const std::vector<uint8_t> aAfter = fileBytes(aName);
-    ASSERT_EQ(aAfter.size(), aFile.size());
-    for (std::size_t i = 0; i < aFile.size(); ++i) {
-        const std::size_t aLineStart = aHeader + aRecord;
-        const bool aChanged = i >= aLineStart + 5 && i < aLineStart + 9;
-        if (!aChanged) {
-            EXPECT_EQ(aAfter[i], aFile[i]) << "byte " << i;
-        }
-    }
+    f.readLines(2, 1, 0, aPixels - 1, aBack.data());
+    EXPECT_EQ(aBack, aCells(2));
+    f.close();
+    const uint8_t aNew[4] = {0xFF, 0xF9, 0x00, 0x4D};
+    std::copy(aNew, aNew + 4, aExpected.begin() + aHeader + aRecord + 3 + 2);  // line 1, columns 1 and 2
+    EXPECT_EQ(fileBytes(aName), aExpected);
 }
 
+// Lines missing at the tail are written as nulls at close, prefix included; lines skipped in the
+// middle are not filled, and a file written to its end is not touched.
 TEST_F(RasterFileTest, NullLineCompletionAtClose)
 {
-    const std::string aName = path("nulls");
-    CRasterFileParam p = param(aName, 5, 3, CQORV_CELL_FLOAT);
+    CRasterFileParam p = param(path("nulls"), 5, 3, CQORV_CELL_FLOAT);
     p.mRowPrefix = 2;
     CRasterFile w;
     w.openWrite(CQORV_RF_OPEN_WRITE, p);
@@ -229,28 +180,23 @@ TEST_F(RasterFileTest, NullLineCompletionAtClose)
     std::vector<float> aRow = {1, 2, 3};
     w.writeLines(0, 1, aRow.data());
     w.close();
-
-    const std::vector<uint8_t> aFile = fileBytes(aName);
+    const std::vector<uint8_t> aFile = fileBytes(p.mFileName);
     const int aRecord = 2 + 3 * 4;
     ASSERT_EQ(aFile.size(), static_cast<std::size_t>(5 * aRecord));
     EXPECT_EQ(aFile[0], 9);
-    for (std::size_t i = aRecord; i < aFile.size(); ++i) ASSERT_EQ(aFile[i], 0) << "byte " << i;  // prefix too
+    EXPECT_EQ(std::vector<uint8_t>(aFile.begin() + aRecord, aFile.end()), std::vector<uint8_t>(4 * aRecord, 0));
     EXPECT_EQ(countOf("WARNING NULL line writed :1 in file :"), 1);
 
-    // Lines skipped in the middle are not filled; only the tail counts.
     const std::string aHoles = path("holes");
     w.openWrite(CQORV_RF_OPEN_WRITE, param(aHoles, 6, 3, CQORV_CELL_FLOAT));
     w.writeLines(0, 1, aRow.data());
-    aRow = {4, 5, 6};
     w.writeLines(3, 1, aRow.data());
     EXPECT_EQ(w.getMaxLineWritten(), 4);
     w.close();
     EXPECT_EQ(fileSize(aHoles), 6 * 12);
     EXPECT_EQ(countOf("WARNING NULL line writed :4 in file :"), 1);
 
-    // A file written to the end is not touched.
-    const std::string aFull = path("full");
-    w.openWrite(CQORV_RF_OPEN_WRITE, param(aFull, 2, 3, CQORV_CELL_FLOAT));
+    w.openWrite(CQORV_RF_OPEN_WRITE, param(path("full"), 2, 3, CQORV_CELL_FLOAT));
     std::vector<float> aBoth(6, 1.0f);
     w.writeLines(0, 2, aBoth.data());
     w.close();
@@ -262,34 +208,30 @@ TEST_F(RasterFileTest, NullLineCompletionAtClose)
 TEST_F(RasterFileTest, ReadCacheInBothTimeDirections)
 {
     const int aLines = 10, aPixels = 5;
-    const std::string aName = path("cache");
     std::vector<fcomplex> aAll(aLines * aPixels);
     for (int l = 0; l < aLines; ++l)
         for (int c = 0; c < aPixels; ++c) aAll[l * aPixels + c] = fcomplex(float(l), float(c));
-    writeBytes(aName, asBytes(aAll));
-
-    auto aCellAt = [](const uint8_t* p) { fcomplex v; std::memcpy(&v, p, sizeof v); return v; };
+    CRasterFileParam p = param(path("cache"), aLines, aPixels, CQORV_CELL_FLOAT_COMPLEX);
+    writeBytes(p.mFileName, asBytes(aAll));
+    auto aCellAt = [](const uint8_t* theCell) { fcomplex v; std::memcpy(&v, theCell, sizeof v); return v; };
 
     CRasterFile f;
-    f.openRead(param(aName, aLines, aPixels, CQORV_CELL_FLOAT_COMPLEX));
+    f.openRead(p);
     f.setLineCache(4);
     EXPECT_EQ(aCellAt(f.getLine(2)), fcomplex(2, 0));
-    EXPECT_EQ(f.getLinePosition(), 6);  // window 2..5 read in one go
     EXPECT_EQ(aCellAt(f.getLine(5, 3)), fcomplex(5, 3));
-    EXPECT_EQ(f.getLinePosition(), 6);  // no access
+    EXPECT_EQ(f.getLinePosition(), 6);  // window 2..5 read in one go
     EXPECT_EQ(aCellAt(f.getLine(8)), fcomplex(8, 0));
     EXPECT_EQ(f.getLinePosition(), 10);  // window 8..9, cut at the last line
     EXPECT_EQ(aCellAt(f.getLine(1, 4)), fcomplex(1, 4));
     f.close();
 
-    CRasterFileParam p = param(aName, aLines, aPixels, CQORV_CELL_FLOAT_COMPLEX);
     p.mLinesTimeDecrease = true;
     f.openRead(p);
     f.setLineCache(4);
     EXPECT_EQ(aCellAt(f.getLine(7)), fcomplex(7, 0));
-    EXPECT_EQ(f.getLinePosition(), 8);  // window 4..7
     EXPECT_EQ(aCellAt(f.getLine(4, 2)), fcomplex(4, 2));
-    EXPECT_EQ(f.getLinePosition(), 8);
+    EXPECT_EQ(f.getLinePosition(), 8);  // window 4..7
     EXPECT_EQ(aCellAt(f.getLine(2)), fcomplex(2, 0));
     EXPECT_EQ(f.getLinePosition(), 3);  // window 0..2, cut at line 0
 
@@ -302,6 +244,7 @@ TEST_F(RasterFileTest, ReadCacheInBothTimeDirections)
     f.close();
 }
 
+// Lines written out of order through the write queue land in their places, with no null lines.
 TEST_F(RasterFileTest, WriteQueueKeepsOrderAndFlushes)
 {
     const int aLines = 7, aPixels = 3;
@@ -309,88 +252,60 @@ TEST_F(RasterFileTest, WriteQueueKeepsOrderAndFlushes)
     CRasterFile w;
     w.openWrite(CQORV_RF_OPEN_WRITE, param(aName, aLines, aPixels, CQORV_CELL_FLOAT));
     w.setLineCache(3);
-    const int aOrder[aLines] = {5, 6, 0, 1, 2, 3, 4};
     std::vector<float> aRow(aPixels);
-    for (int i = 0; i < aLines; ++i) {
-        for (int c = 0; c < aPixels; ++c) aRow[c] = float(aOrder[i] * 10 + c);
-        fqorvWriteLine(w, aRow.data(), aOrder[i]);
-        if (i == 2) {
-            EXPECT_EQ(w.getMaxLineWritten(), 0);  // all three held
-        }
+    for (int l : {5, 6, 0, 1, 2, 3, 4}) {
+        for (int c = 0; c < aPixels; ++c) aRow[c] = float(l * 10 + c);
+        fqorvWriteLine(w, aRow.data(), l);
     }
-    EXPECT_GT(w.getMaxLineWritten(), 0);
     w.close();
     EXPECT_EQ(countOf("WARNING NULL line writed"), 0);
-
-    std::vector<float> aFile = fromBytes<float>(fileBytes(aName).data(), aLines * aPixels);
+    const std::vector<float> aFile = fromBytes<float>(fileBytes(aName).data(), aLines * aPixels);
     for (int l = 0; l < aLines; ++l)
         for (int c = 0; c < aPixels; ++c) EXPECT_EQ(aFile[l * aPixels + c], float(l * 10 + c));
 }
 
 // A read past the end of a short file fails with 261125 instead of returning old bytes, on the
-// whole-record road, on the per-line road and through the cache.
+// whole-record road, on the per-line road, through the cache and in update status.
 TEST_F(RasterFileTest, ShortFileReadFails)
 {
-    const int aPixels = 4, aRecord = aPixels * 4;
-    const std::string aName = path("short");
-    std::vector<uint8_t> aBytes = pattern(3 * aRecord + aRecord / 2);
-    writeBytes(aName, aBytes);
+    const int aPixels = 4;
+    const CRasterFileParam p = param(path("short"), 5, aPixels, CQORV_CELL_FLOAT);
+    writeBytes(p.mFileName, pattern(3 * aPixels * 4 + aPixels * 2));  // three lines and a half
     std::vector<float> aLine(aPixels * 2);
-
-    {
+    const std::function<void(CRasterFile&)> aRoads[] = {
+        [&](CRasterFile& f) { f.openRead(p); f.readLines(2, 1, 0, aPixels - 1, aLine.data()); f.readLines(3, 1, 0, aPixels - 1, aLine.data()); },
+        [&](CRasterFile& f) { f.openRead(p); f.readLines(2, 2, 1, 2, aLine.data()); },
+        [&](CRasterFile& f) { f.openRead(p); f.setLineCache(8); f.getLine(0); },
+        [&](CRasterFile& f) { f.openWrite(CQORV_RF_OPEN_READ_WRITE, p); fqorvReadLine(f, aLine.data(), 4); },
+    };
+    for (const auto& aRoad : aRoads) {
         CRasterFile f;
-        f.openRead(param(aName, 5, aPixels, CQORV_CELL_FLOAT));
-        f.readLines(2, 1, 0, aPixels - 1, aLine.data());
-        EXPECT_QORV_FAILURE(f.readLines(3, 1, 0, aPixels - 1, aLine.data()), CQORV_ERR_RASTER_READ);
-        EXPECT_NE(mEnv.trace().find("Read file  ERROR : STATUS 1"), std::string::npos);
-    }
-    mEnv.reinit();
-    {
-        CRasterFile f;
-        f.openRead(param(aName, 5, aPixels, CQORV_CELL_FLOAT));
-        EXPECT_QORV_FAILURE(f.readLines(2, 2, 1, 2, aLine.data()), CQORV_ERR_RASTER_READ);  // per-line road
-    }
-    mEnv.reinit();
-    {
-        CRasterFile f;
-        f.openRead(param(aName, 5, aPixels, CQORV_CELL_FLOAT));
-        f.setLineCache(8);
-        EXPECT_QORV_FAILURE(f.getLine(0), CQORV_ERR_RASTER_READ);  // the window covers the missing lines
-    }
-    mEnv.reinit();
-    {
-        CRasterFile f;
-        f.openWrite(CQORV_RF_OPEN_READ_WRITE, param(aName, 5, aPixels, CQORV_CELL_FLOAT));
-        EXPECT_QORV_FAILURE(fqorvReadLine(f, aLine.data(), 4), CQORV_ERR_RASTER_READ);
+        EXPECT_QORV_FAILURE(aRoad(f), CQORV_ERR_RASTER_READ);
+        mEnv.reinit();
     }
 }
 
-// A sparse file above 2 GB (no disk cost): its last line is read and written through 64-bit
+// A sparse file above 2 GB (no disk cost): its last lines are read and written through 64-bit
 // offsets on both seek roads.
 TEST_F(RasterFileTest, SparseFileBeyondTwoGigabytes)
 {
-    const int aPixels = 5616, aLines = 48000, aHeader = 100;
-    const int aRecord = aPixels * 8;
+    const int aPixels = 5616, aLines = 48000, aHeader = 100, aRecord = aPixels * 8;
     const int64_t aSize = int64_t(aHeader) + int64_t(aRecord) * aLines;
     ASSERT_GT(aSize, int64_t(1) << 31);
-    const std::string aName = path("sparse");
+    CRasterFileParam p = param(path("sparse"), aLines, aPixels, CQORV_CELL_FLOAT_COMPLEX);
+    p.mHeaderLen = aHeader;
     {
-        const int fd = ::open(aName.c_str(), O_CREAT | O_RDWR | O_TRUNC, 0644);
+        const int fd = ::open(p.mFileName.c_str(), O_CREAT | O_RDWR | O_TRUNC, 0644);
         ASSERT_GE(fd, 0);
         ASSERT_EQ(::ftruncate(fd, static_cast<off_t>(aSize)), 0);
         std::vector<fcomplex> aLast(aPixels);
         for (int c = 0; c < aPixels; ++c) aLast[c] = fcomplex(float(c), -1.0f);
-        const off_t aOffset = static_cast<off_t>(aHeader + int64_t(aRecord) * (aLines - 1));
-        ASSERT_EQ(::pwrite(fd, aLast.data(), aRecord, aOffset), aRecord);
+        ASSERT_EQ(::pwrite(fd, aLast.data(), aRecord, static_cast<off_t>(aSize - aRecord)), aRecord);
         ::close(fd);
     }
-    CRasterFileParam p = param(aName, aLines, aPixels, CQORV_CELL_FLOAT_COMPLEX);
-    p.mHeaderLen = aHeader;
     std::vector<fcomplex> aLine(aPixels);
-
     CRasterFile f;
     f.openRead(p);
-    EXPECT_EQ(f.getMaxLineSeek(), 2000000000 / aRecord);
     fqorvReadLine(f, aLine.data(), 1);  // the first seek after the open: the ordinary road
     EXPECT_EQ(aLine[3], fcomplex(0.0f, 0.0f));
     EXPECT_TRUE(f.isLongSeek());
@@ -407,7 +322,7 @@ TEST_F(RasterFileTest, SparseFileBeyondTwoGigabytes)
     std::vector<fcomplex> aNew(aPixels, fcomplex(3.5f, 4.5f));
     fqorvWriteLine(f, aNew.data(), aLines - 2);
     f.close();
-    EXPECT_EQ(fileSize(aName), aSize);
+    EXPECT_EQ(fileSize(p.mFileName), aSize);
     f.openRead(p);
     fqorvReadLine(f, aLine.data(), aLines - 2);
     EXPECT_EQ(aLine[17], fcomplex(3.5f, 4.5f));
@@ -416,80 +331,52 @@ TEST_F(RasterFileTest, SparseFileBeyondTwoGigabytes)
     f.close();
 
     // A new file written at its last line only: 64-bit seek on the write road, nothing completed.
-    const std::string aNewName = path("sparse_new");
-    p.mFileName = aNewName;
+    p.mFileName = path("sparse_new");
     f.openWrite(CQORV_RF_OPEN_WRITE, p);
     fqorvWriteLine(f, aNew.data(), aLines - 1);
     f.close();
-    EXPECT_EQ(fileSize(aNewName), aSize);
+    EXPECT_EQ(fileSize(p.mFileName), aSize);
     struct stat s;
-    ASSERT_EQ(stat(aNewName.c_str(), &s), 0);
+    ASSERT_EQ(stat(p.mFileName.c_str(), &s), 0);
     EXPECT_LT(static_cast<long long>(s.st_blocks) * 512, 64LL << 20);  // still sparse
     EXPECT_EQ(countOf("WARNING NULL line writed"), 0);
 }
 
+// Each misuse fails with its id and names itself in the trace.
 TEST_F(RasterFileTest, RefusalsWithTheirIdsAndWords)
 {
     const std::string aName = path("refuse");
     writeBytes(aName, std::vector<uint8_t>(64, 1));
     const CRasterFileParam p = param(aName, 4, 4, CQORV_CELL_FLOAT);
-    std::vector<float> aBuffer(16);
-    auto aTraceHas = [&](const char* theWords) { return mEnv.trace().find(theWords) != std::string::npos; };
-
-    CRasterFile f;
-    EXPECT_QORV_FAILURE(f.close(), CQORV_ERR_RASTER_ACCESS);
-    EXPECT_TRUE(aTraceHas("Error: attempting to close a raster file no file name while it was not open\n"));
-    mEnv.reinit();
-    EXPECT_QORV_FAILURE(f.readLines(0, 1, 0, 3, aBuffer.data()), CQORV_ERR_RASTER_READ);
-    EXPECT_TRUE(aTraceHas(" while it was not open\n"));
-    mEnv.reinit();
-    EXPECT_QORV_FAILURE(f.writeLines(0, 1, aBuffer.data()), CQORV_ERR_WRITE_FILE);
-    EXPECT_TRUE(aTraceHas("Error: attempting to write to the raster file "));
-    mEnv.reinit();
-
     CRasterFileParam aNoName = p;
     aNoName.mFileName.clear();
-    EXPECT_QORV_FAILURE(f.openRead(aNoName), CQORV_ERR_RASTER_ACCESS);
-    EXPECT_TRUE(aTraceHas("You have to set the file name in CRasterFileParam \n"));
-    mEnv.reinit();
-    EXPECT_QORV_FAILURE(f.openRead(param(path("missing"), 4, 4, CQORV_CELL_FLOAT)), CQORV_ERR_MISSING_FILE);
-    EXPECT_TRUE(aTraceHas("Error: cannot open the file: "));
-    EXPECT_TRUE(aTraceHas("  errno = 2"));
-    mEnv.reinit();
-    EXPECT_QORV_FAILURE(f.openWrite(CQORV_RF_OPEN_WRITE, param(path("no/such/dir/x"), 4, 4, CQORV_CELL_FLOAT)),
-                        CQORV_ERR_RASTER_ACCESS);
-    mEnv.reinit();
-    EXPECT_QORV_FAILURE(f.openRead(param(aName, 4, 4, 15)), CQORV_ERR_RASTER_READ);
-    EXPECT_TRUE(aTraceHas("Error: unsupported raster file type 15"));
-    EXPECT_TRUE(aTraceHas("theCellType = 15"));
-    mEnv.reinit();
+    std::vector<float> aBuffer(16);
+    CRasterFile f;
+    auto aRefused = [&](auto theStatement, int theId, const char* theWords) {
+        EXPECT_QORV_FAILURE(theStatement(), theId);
+        EXPECT_NE(mEnv.trace().find(theWords), std::string::npos) << theWords;
+        mEnv.reinit();
+    };
+    aRefused([&] { f.close(); }, CQORV_ERR_RASTER_ACCESS, "Error: attempting to close a raster file no file name while it was not open\n");
+    aRefused([&] { f.readLines(0, 1, 0, 3, aBuffer.data()); }, CQORV_ERR_RASTER_READ, " while it was not open\n");
+    aRefused([&] { f.writeLines(0, 1, aBuffer.data()); }, CQORV_ERR_WRITE_FILE, "Error: attempting to write to the raster file ");
+    aRefused([&] { f.openRead(aNoName); }, CQORV_ERR_RASTER_ACCESS, "You have to set the file name in CRasterFileParam \n");
+    aRefused([&] { f.openRead(param(path("missing"), 4, 4, CQORV_CELL_FLOAT)); }, CQORV_ERR_MISSING_FILE, "  errno = 2");
+    aRefused([&] { f.openWrite(CQORV_RF_OPEN_WRITE, param(path("no/such/dir/x"), 4, 4, CQORV_CELL_FLOAT)); },
+             CQORV_ERR_RASTER_ACCESS, "");
+    aRefused([&] { f.openRead(param(aName, 4, 4, 15)); }, CQORV_ERR_RASTER_READ, "Error: unsupported raster file type 15");
 
     f.openRead(p);
-    EXPECT_QORV_FAILURE(f.openRead(p), CQORV_ERR_RASTER_ACCESS);
-    EXPECT_TRUE(aTraceHas(" in input mode while it was not closed\n"));
-    mEnv.reinit();
-    EXPECT_QORV_FAILURE(f.writeLines(0, 1, aBuffer.data()), CQORV_ERR_WRITE_FILE);
-    EXPECT_TRUE(aTraceHas(" while it was open in read mode\n"));
-    mEnv.reinit();
-    EXPECT_QORV_FAILURE(f.readLines(0, 0, 0, 3, aBuffer.data()), CQORV_ERR_RASTER_READ);
-    EXPECT_TRUE(aTraceHas(" a negative or null number of lines\n"));
-    mEnv.reinit();
-    EXPECT_QORV_FAILURE(fqorvReadLine(f, aBuffer.data(), 0, 2, 1), CQORV_ERR_RASTER_ACCESS);
-    EXPECT_TRUE(aTraceHas("theColStart 2"));
-    mEnv.reinit();
-    EXPECT_QORV_FAILURE(fqorvReadLine(f, aBuffer.data(), 4), CQORV_ERR_RASTER_ACCESS);
-    mEnv.reinit();
+    aRefused([&] { f.openRead(p); }, CQORV_ERR_RASTER_ACCESS, " in input mode while it was not closed\n");
+    aRefused([&] { f.writeLines(0, 1, aBuffer.data()); }, CQORV_ERR_WRITE_FILE, " while it was open in read mode\n");
+    aRefused([&] { f.readLines(0, 0, 0, 3, aBuffer.data()); }, CQORV_ERR_RASTER_READ, " a negative or null number of lines\n");
+    aRefused([&] { fqorvReadLine(f, aBuffer.data(), 0, 2, 1); }, CQORV_ERR_RASTER_ACCESS, "theColStart 2");
+    aRefused([&] { fqorvReadLine(f, aBuffer.data(), 4); }, CQORV_ERR_RASTER_ACCESS, "");
     f.close();
 
-    const std::string aOut = path("refuse_out");
-    f.openWrite(CQORV_RF_OPEN_WRITE, param(aOut, 4, 4, CQORV_CELL_FLOAT));
-    EXPECT_QORV_FAILURE(f.readLines(0, 1, 0, 3, aBuffer.data()), CQORV_ERR_RASTER_READ);
-    EXPECT_TRUE(aTraceHas(" while it was open in write mode\n"));
-    mEnv.reinit();
-    EXPECT_QORV_FAILURE(f.writeLines(0, -1, aBuffer.data()), CQORV_ERR_WRITE_FILE);
-    EXPECT_TRUE(aTraceHas("Error: attempting to write to the raster file "));
-    EXPECT_TRUE(aTraceHas(" a negative or null number of lines\n"));
-    mEnv.reinit();
+    f.openWrite(CQORV_RF_OPEN_WRITE, param(path("refuse_out"), 4, 4, CQORV_CELL_FLOAT));
+    aRefused([&] { f.readLines(0, 1, 0, 3, aBuffer.data()); }, CQORV_ERR_RASTER_READ, " while it was open in write mode\n");
+    aRefused([&] { f.writeLines(0, -1, aBuffer.data()); }, CQORV_ERR_WRITE_FILE, " a negative or null number of lines\n");
     f.close();
 }
 
@@ -513,10 +400,7 @@ TEST_F(RasterFileTest, FailedSeekOnAPipe)
         f.openRead(param(aName, 10, 4, CQORV_CELL_FLOAT));
         f.readLines(0, 1, 0, 3, aLine.data());  // sequential: no seek
         EXPECT_QORV_FAILURE(f.readLines(5, 1, 0, 3, aLine.data()), CQORV_ERR_RASTER_READ);
-        const std::string aTrace = mEnv.trace();
-        EXPECT_NE(aTrace.find("FAIL seek AP : "), std::string::npos);
-        EXPECT_NE(aTrace.find("ERROR LOOP BEFORE seekLinePosition  :"), std::string::npos);
-        EXPECT_NE(aTrace.find("theRowStart = 5"), std::string::npos);
+        EXPECT_NE(mEnv.trace().find("FAIL seek AP : "), std::string::npos);
     }
     aWriter.join();
 }
@@ -582,38 +466,4 @@ TEST_F(RasterFileTest, WriteFailureCutsToWholeRecords)
     const long long aSize = fileSize(aName);
     EXPECT_EQ(aSize % aRecord, 0);
     EXPECT_LE(aSize, 64LL * aRecord);
-    EXPECT_EQ(w.getStatus(), CQORV_RF_CLOSE);
-}
-
-TEST_F(RasterFileTest, TiffStatesOpenAndClose)
-{
-    static int sHeaderWrites = 0;
-    QorvTiffHeaderWriter aOld = fqorvSetTiffHeaderWriter([](CRasterFile&) { ++sHeaderWrites; });
-    const std::string aName = path("picture.tif");
-    CRasterFile t;
-    t.openTiff(CQORV_RF_OPEN_TIFF_WRITE, param(aName, 2, 3, CQORV_CELL_UNSIGNED_BYTE));
-    EXPECT_EQ(t.getStatus(), CQORV_RF_OPEN_TIFF_WRITE);
-    TIFF* aTiff = static_cast<TIFF*>(t.tiffHandle());
-    ASSERT_NE(aTiff, nullptr);
-    TIFFSetField(aTiff, TIFFTAG_IMAGEWIDTH, 3);
-    TIFFSetField(aTiff, TIFFTAG_IMAGELENGTH, 2);
-    TIFFSetField(aTiff, TIFFTAG_BITSPERSAMPLE, 8);
-    TIFFSetField(aTiff, TIFFTAG_SAMPLESPERPIXEL, 1);
-    TIFFSetField(aTiff, TIFFTAG_PHOTOMETRIC, PHOTOMETRIC_MINISBLACK);
-    uint8_t aRow[3] = {1, 2, 3};
-    for (int r = 0; r < 2; ++r) ASSERT_EQ(TIFFWriteScanline(aTiff, aRow, r, 0), 1);
-    std::vector<float> aLine(3);
-    EXPECT_QORV_FAILURE(t.readLines(0, 1, 0, 2, aLine.data()), CQORV_ERR_RASTER_READ);
-    mEnv.reinit();
-    t.close(true);
-    EXPECT_EQ(sHeaderWrites, 1);
-    EXPECT_EQ(t.getStatus(), CQORV_RF_CLOSE);
-
-    t.openTiff(CQORV_RF_OPEN_TIFF_READ, param(aName, 2, 3, CQORV_CELL_UNSIGNED_BYTE));
-    EXPECT_EQ(t.getStatus(), CQORV_RF_OPEN_TIFF_READ);
-    uint32_t aWidth = 0;
-    TIFFGetField(static_cast<TIFF*>(t.tiffHandle()), TIFFTAG_IMAGEWIDTH, &aWidth);
-    EXPECT_EQ(aWidth, 3u);
-    t.close();
-    fqorvSetTiffHeaderWriter(aOld);
 }

@@ -9,25 +9,22 @@
 
 using storetest::StoreEnv;
 
+// A size alone initialises a field and zeroes its numbers; only elements given a value count as
+// set; a reset empties the field again.
 TEST(StoreFields, ScalarVectorMatrixAccessAndFlags)
 {
     StoreEnv aEnv;
     auto aHeader = storetest::makeTestHeader();
     CDescriptionHeader& h = *aHeader;
     CDescriptionField& aInt = h["StoreTest.IntScalar"];
-    EXPECT_EQ(aInt.mRowNbr, 1);
-    EXPECT_EQ(aInt.mColNbr, 1);
     EXPECT_FALSE(aInt.isInitialised());
     aInt.setValue(7);
-    EXPECT_TRUE(aInt.isInitialised());
-    EXPECT_EQ(aInt.getInteger(), 7);
     EXPECT_EQ(aInt.getInteger(0), 7);
 
     CDescriptionField& aVec = h["StoreTest.DblVector"];
-    EXPECT_FALSE(aVec.isInitialised());
     aVec.resize(1, 3);
-    EXPECT_TRUE(aVec.isInitialised());  // a size is enough
-    EXPECT_EQ(aVec.getDouble(2), 0.0);   // zeroed, no "not set" failure for numbers
+    EXPECT_TRUE(aVec.isInitialised());
+    EXPECT_EQ(aVec.getDouble(2), 0.0);  // no "not set" failure for numbers
     aVec.setValue(2, 4.5);
     EXPECT_EQ(aVec.getDouble(2), 4.5);
     EXPECT_TRUE(aVec.isSet(0, 2));
@@ -38,13 +35,10 @@ TEST(StoreFields, ScalarVectorMatrixAccessAndFlags)
     aMat.resize(2, 3);
     aMat.setValue(1, 2, std::string("x"));
     EXPECT_STREQ(aMat.getString(1, 2), "x");
-    EXPECT_EQ(aMat.getNbrOfRows(), 2);
-    EXPECT_EQ(aMat.getNbrOfElements(), 3);
 
     aVec.reset();
-    EXPECT_EQ(aVec.mColNbr, 0);
-    EXPECT_FALSE(aVec.isInitialised());
     aInt.reset();
+    EXPECT_FALSE(aVec.isInitialised());
     EXPECT_FALSE(aInt.isInitialised());
 }
 
@@ -92,26 +86,22 @@ TEST(StoreFields, PulseDurationReadPastTheEndAnswersNoValue)
     EXPECT_QORV_FAILURE((*aHeader)["ChannelInfo.BandWidth"].getDouble(3), CQORV_ERR_INDEX_RANGE);
 }
 
+// A MULTIPLE resizes all its sub-fields at once and counts as set when every sub-field is.
 TEST(StoreFields, MultipleFieldsResizeAndInitialiseThroughSubFields)
 {
     StoreEnv aEnv;
     auto aHeader = storetest::makeTestHeader();
     CDescriptionHeader& h = *aHeader;
     CDescriptionField& aTrack = h["StoreTest.Track"];
-    EXPECT_EQ(aTrack.mStructure, CQORV_DS_MULTIPLE);
-    EXPECT_EQ(aTrack.mDataType, CQORV_DT_FIELD);
-    EXPECT_EQ(aTrack.mColNbr, 2);
-    EXPECT_EQ(aTrack.getNbrOfElements(), 0);
     aTrack.resize(1, 5);
     EXPECT_EQ(aTrack.getNbrOfElements(), 5);
-    EXPECT_EQ(h["StoreTest.TrackV"].mColNbr, 5);
-    EXPECT_EQ(aTrack.getSubField(1), &h["StoreTest.TrackV"]);
-    EXPECT_EQ(h["StoreTest.TrackV"].mParentIndex, h["StoreTest.TrackT"].mParentIndex);
+    EXPECT_EQ(h["StoreTest.TrackV"].getNbrOfElements(), 5);
+    EXPECT_EQ(h["StoreTest.TrackT"].getNbrOfElements(), 5);
     EXPECT_TRUE(aTrack.isInitialised());
 
     CDescriptionField& aPair = h["StoreTest.Pair"];
     h["StoreTest.PairA"].setValue(1.0);
-    EXPECT_FALSE(aPair.isInitialised());  // all sub-fields must be set
+    EXPECT_FALSE(aPair.isInitialised());
     h["PairB"].setValue(2.0);
     EXPECT_TRUE(aPair.isInitialised());
 }
@@ -128,14 +118,10 @@ TEST(StoreLookup, QualifiedAndUnqualifiedKeys)
     EXPECT_EQ(h.findField("NoSuchField"), nullptr);
     EXPECT_QORV_FAILURE(h["NoSection.PRF"], CQORV_ERR_UNKNOWN_KEY);
     EXPECT_QORV_FAILURE(h["NoSuchField"], CQORV_ERR_UNKNOWN_KEY);
-    EXPECT_NE(aEnv.trace().find("<< Total number of Sections : 21 >>"), std::string::npos);
-    aEnv.reinit();
 
-    // "The first section that holds it": a section listed earlier wins.
+    // A null name ends the section list.
     CDescriptionHeader aTwo({"Sensor", "sar_processing", nullptr, "Processing"});
-    EXPECT_EQ(aTwo.mSectionNbr, 2);  // the null name ends the list
-    EXPECT_EQ(aTwo.getSection(1)->mName, "sar_processing");
-    EXPECT_EQ(aTwo.getSection(2), nullptr);
+    EXPECT_EQ(aTwo.mSectionNbr, 2);
     EXPECT_EQ(aTwo.getSection("Processing"), nullptr);
 }
 
