@@ -12,18 +12,19 @@
 
 namespace etest {
 
-/// Writes theName (cells of theCellType, LSBF, null -9999) and theName.sml; cell (r, c) = theValue(r, c).
+/// Writes theName (cells of theCellType, null -9999) and theName.sml; cell (r, c) = theValue(r, c).
 inline void writeRaster(const std::string& theName, int theLines, int thePixels, const char* theCellType,
-                        const char* theUnits, const std::function<fcomplex(int, int)>& theValue)
+                        const char* theUnits, const std::function<fcomplex(int, int)>& theValue,
+                        const char* theByteOrder = "LSBF", int theRowPrefix = 0)
 {
     auto h = CDescriptionHeader::makeFull();
     (*h)["RasterInfo.NrOfLinesPerImage"].setValue(theLines);
     (*h)["RasterInfo.NrOfPixelsPerLine"].setValue(thePixels);
     (*h)["RasterInfo.CellType"].setValue(theCellType);
     (*h)["RasterInfo.DataUnits"].setValue(theUnits);
-    (*h)["RasterInfo.BytesOrder"].setValue("LSBF");
+    (*h)["RasterInfo.BytesOrder"].setValue(theByteOrder);
     (*h)["RasterInfo.HeaderOffset"].setValue(0);
-    (*h)["RasterInfo.RowPrefix"].setValue(0);
+    (*h)["RasterInfo.RowPrefix"].setValue(theRowPrefix);
     (*h)["RasterInfo.RowSuffix"].setValue(0);
     (*h)["RasterInfo.NullCellValue"].setValue(-9999.0);
     ASSERT_TRUE(h->write((theName + "_hdr").c_str(), true, false));

@@ -2,6 +2,9 @@
 #include <gtest/gtest.h>
 
 #include <cmath>
+#include <cstdint>
+#include <cstdio>
+#include <cstring>
 
 #include "export_test_util.h"
 #include "qorv_image_stats.h"
@@ -56,6 +59,41 @@ TEST(Normalisation, ReachesTheTargetPowerKeepsNullsAndIsStableOnASecondRun)
                        [](int r, int c) { return fcomplex((c / 2) % 2 ? 3.0f : 1.0f, 0.0f); });
     fqorvNormalizeRaster(aTwo.c_str(), aTwo.c_str(), 100.0, 1.0, true, &aFactor, 0.3333);
     EXPECT_NEAR(aFactor, 10.0 / (2.0 + 1.0), 1e-9);  // sample columns 4, 6: amplitudes 1 and 3
+}
+
+TEST(Normalisation, BigEndianRecordsKeepTheirPrefixesAndCellsThatAreNotFiniteBecomeNull)
+{
+    qtest::InProcessEnvironment aEnv;
+    const std::string aName = aEnv.workPath("big_slc");
+    // Amplitude 3 in the central sample window; in row 0 a null, a NaN, an infinite and an
+    // overflowing cell, set in the file's bytes (a typed write would store NaN as null).
+    const auto aCell = [](int r, int c) { return std::polar(3.0f, 0.1f * static_cast<float>(r * 12 + c)); };
+    etest::writeRaster(aName, 12, 12, "FLOAT_COMPLEX", "SLC", aCell, "MSBF", 4);
+    const float aRow0[] = {-9999.0f, -9999.0f, std::nanf(""), 1.0f, INFINITY, 2.0f, 3e38f, 1.0f};
+    {
+        std::FILE* f = std::fopen(aName.c_str(), "r+b");
+        for (int r = 0; r < 12; ++r) std::fseek(f, r * 100L, SEEK_SET), std::fwrite("PRFX", 1, 4, f);
+        for (int k = 0; k < 8; ++k) {
+            uint32_t w;
+            std::memcpy(&w, &aRow0[k], 4);
+            w = __builtin_bswap32(w);
+            std::fseek(f, 4 + 4L * k, SEEK_SET);
+            std::fwrite(&w, 4, 1, f);
+        }
+        std::fclose(f);
+    }
+    double aFactor = 0;
+    fqorvNormalizeRaster(aName.c_str(), aName.c_str(), 16000.0, 0.0, true, &aFactor, 0.3333);
+    ASSERT_NEAR(aFactor, std::sqrt(16000.0) / 3.0, 1e-5);
+    const auto aCells = etest::readRaster(aName);
+    const auto s = [&](float v) { return static_cast<float>(v * aFactor); };
+    EXPECT_EQ(aCells[0], fcomplex(-9999.0f, -9999.0f));
+    EXPECT_EQ(aCells[1], fcomplex(-9999.0f, 1.0f));      // a NaN part makes the cell null: not scaled
+    EXPECT_EQ(aCells[2], fcomplex(-9999.0f, s(2.0f)));   // scaled, the infinite part stored as null
+    EXPECT_EQ(aCells[3], fcomplex(-9999.0f, s(1.0f)));   // the product overflows single precision
+    for (int k = 4; k < 144; ++k) ASSERT_EQ(aCells[k], fcomplex(s(aCell(k / 12, k % 12).real()), s(aCell(k / 12, k % 12).imag()))) << k;
+    const std::string aBytes = qtest::readFile(aName);
+    for (int r = 0; r < 12; ++r) EXPECT_EQ(aBytes.substr(r * 100, 4), "PRFX") << r;
 }
 
 TEST(Normalisation, AllNullRasterIsUnchangedAndMissingHeaderFails)
