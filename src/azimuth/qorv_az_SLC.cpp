@@ -7,6 +7,7 @@
 #include "qorv_az_SLC.h"
 
 #include <algorithm>
+#include <chrono>
 #include <cmath>
 #include <cstdio>
 #include <cstdlib>
@@ -332,7 +333,17 @@ struct CBlockState {
     std::vector<fcomplex> mLine;        // current input line
     std::vector<fcomplex> mOutLine;
     long long aDummyValNbr = 0, aNoDummyValNbr = 0;
+    double mReadSeconds = 0.0, mFocusSeconds = 0.0, mGuardSeconds = 0.0, mWriteSeconds = 0.0;  // traced at the end
 };
+
+/// Seconds since theStart, and theStart moved to now.
+double fLap(std::chrono::steady_clock::time_point& theStart)
+{
+    const auto aNow = std::chrono::steady_clock::now();
+    const double s = std::chrono::duration<double>(aNow - theStart).count();
+    theStart = aNow;
+    return s;
+}
 
 /// Step 13: writes the block's valid rows of subaperture i under the mask of the input lines.
 void fWriteRows(CRasterFile& theIn, CRasterFile& theOut, const CAzSlcParam& p, COmegaKBlockFocuser& theFocuser, int i,
@@ -382,6 +393,7 @@ void fProcessSubaperture(YDF_SAR& theSar, CRasterFile& theIn, CRasterFile& theOu
                          COmegaKBlockFocuser& theFocuser, CSubapertureFilter* theFilter, int i, int theOffset,
                          double fd, CBlockState& st)
 {
+    auto aClock = std::chrono::steady_clock::now();
     double fdc = p.subapertureCentroid(i, fd);
     double ws = 0.0, ws1 = 0.0, ws2 = 0.0;
     fqorvSubapertureAngles(p.mGeometry, fdc, ws, ws1, ws2);
@@ -402,6 +414,8 @@ void fProcessSubaperture(YDF_SAR& theSar, CRasterFile& theIn, CRasterFile& theOu
         theFilter->fill(aRead, p.mLines, theOffset, p.mGeometry.mFilterBandwidthRad, ws1, aBlock);
     }
 
+    st.mReadSeconds += fLap(aClock);
+
     // Step 9: the Doppler bin keeps the centroid above; the tables take the one at the final block centre.
     const int ndc = fqorvDopplerBin(ws2, p.nazft);
     const int aCentreLine = std::min(theOffset + p.nazft / 2, p.lastLine());
@@ -411,6 +425,7 @@ void fProcessSubaperture(YDF_SAR& theSar, CRasterFile& theIn, CRasterFile& theOu
     fdc = p.subapertureCentroid(i, fdNew);
     theFocuser.setDoppler(fdc, ndc, p.mShift);
     theFocuser.focus();
+    st.mFocusSeconds += fLap(aClock);
 
     // Step 12: guards of every range sample at the block centre.
     int mdsk1 = 0, mdsk2 = 0;
@@ -421,7 +436,9 @@ void fProcessSubaperture(YDF_SAR& theSar, CRasterFile& theIn, CRasterFile& theOu
         mdsk1 = std::max(mdsk1, m1);
         mdsk2 = std::max(mdsk2, m2);
     }
+    st.mGuardSeconds += fLap(aClock);
     fWriteRows(theIn, theOut, p, theFocuser, i, mdsk2, st);
+    st.mWriteSeconds += fLap(aClock);
 }
 
 /// Step 6: the block loop.
@@ -481,7 +498,10 @@ void fFinish(CRasterFile& theIn, CRasterFile& theOut, CDescriptionHeader& theOut
         QORV_FATAL(CQORV_ERR_CREATE_FILE, aHeaderName.c_str());
     }
     theIn.close();
+    auto aClock = std::chrono::steady_clock::now();
     fqorvNormalizeRaster(p.mWriteName.c_str(), aHeaderName.c_str(), CQORV_NORMALIZE_POWER, 0.0, false, nullptr, 0.3333);
+    fdfTrace("Seconds: reading and filtering %.2f, focusing %.2f, guards %.2f, masking and writing %.2f, normalisation %.2f\n",
+             st.mReadSeconds, st.mFocusSeconds, st.mGuardSeconds, st.mWriteSeconds, fLap(aClock));
     theOutput.reset();
     theOutput.read(aHeaderName.c_str(), false);
     fqorvRenameProduct(p.mWriteName.c_str(), p.mOutput.c_str());
