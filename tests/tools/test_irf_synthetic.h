@@ -69,6 +69,11 @@ inline Weight antenna(double theSpeed)
     };
 }
 
+/// The chain's weights in the ERS-like scene: azimuth Kaiser over 0.8 of the PRF times the
+/// antenna pattern, range Kaiser over the chirp's band.
+inline Weight ersAzimuth() { return band(0.8, 2.12, antenna(kPlatformSpeed)); }
+inline Weight ersRange() { return band(kBandwidth / kFs, 2.12); }
+
 /// Samples 0 .. n-1 of the continuous response of a band: s(x) = integral of W(f - c)
 /// exp(j 2 pi f (x - x0)) df over c +- 1/2 cycle per sample (midpoint rule, 8192 steps), so that
 /// the band's edges are not tied to any transform grid.
