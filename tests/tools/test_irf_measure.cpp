@@ -7,7 +7,6 @@
 
 #include "qorv_irf_ideal.h"
 #include "qorv_irf_measure.h"
-#include "qorv_irf_report.h"
 #include "qorv_irf_truth.h"
 #include "test_irf_synthetic.h"
 
@@ -214,37 +213,4 @@ TEST(IrfTruth, ReadsTargetsAndChoosesThePatternVelocity)
     } catch (const std::runtime_error& e) {
         EXPECT_NE(std::string(e.what()).find("radar.prf"), std::string::npos) << e.what();
     }
-}
-
-// The table and the JSON report carry one row per target, found or not, and the summary.
-TEST(IrfReport, TableAndJsonCarryTargetsIdealAndSummary)
-{
-    CIrfReport aReport;
-    aReport.mTruth.mPrf = kPrf;
-    aReport.mTruth.mSamplingRate = kFs;
-    aReport.mIdeal.mRange = fqorvIrfIdealRangeBand(kBandwidth, kFs, 16);
-    const CIrfChip aImage = pointTarget(64, 64, 30.25, 33.5, band(0.8, 2.12), 0.1, band(0.82, 2.12), 0.0);
-    for (const char* aId : {"P1", "P2"}) {
-        CIrfTargetResult t;
-        t.mTarget.mId = aId;
-        t.mTarget.mLine = 30.0;
-        t.mTarget.mPixel = 33.5;
-        t.mResponse = analyse(aImage, 30.0, 33.5);
-        fqorvIrfCompare(t);
-        aReport.mTargets.push_back(t);
-    }
-    aReport.mTargets[1].mResponse.mFound = false;
-    aReport.mTargets[1].mResponse.mNote = "no signal";
-
-    const std::string aTable = fqorvIrfFormatTable(aReport);
-    for (const char* aWords : {"P1", "P2", "no signal", "measured 1 of 2 targets"})
-        EXPECT_NE(aTable.find(aWords), std::string::npos) << aWords << "\n" << aTable;
-
-    const CJson j = CJson::parse(fqorvIrfReportJson(aReport).dump());
-    ASSERT_EQ(j["targets"].size(), 2u);
-    EXPECT_NEAR(j["targets"].elements()[0]["line_error"].number(), 0.25, 0.005);
-    EXPECT_NEAR(j["targets"].elements()[0]["azimuth_centre_hz"].number(), 0.1 * kPrf, 0.02 * kPrf);
-    EXPECT_FALSE(j["targets"].elements()[1]["found"].boolean());
-    EXPECT_EQ(j["summary"]["measured"].number(), 1.0);
-    EXPECT_NEAR(j["summary"]["max_line_error"].number(), 0.25, 0.005);
 }

@@ -1,8 +1,5 @@
-// The simulator's echoes against the chain's signal convention: range compression with the
-// chain's replica peaks at the two-way delay with the carrier phase -2 pi f0 tau, for up and down
-// chirps; the adjacent-line phase gives the Doppler centroid with its sign, also beyond +-PRF/2;
-// the two-way pattern has its peak at the beam centre and its nulls where sinc^2 has them; a
-// window move shifts the echo by whole samples; the noise has the variance of the image SNR.
+// The simulator's echoes against the chain's signal convention: delay and carrier phase after
+// compression with the chain's replica, Doppler sign, the two-way pattern, window moves, noise.
 #include <algorithm>
 #include <cmath>
 #include <complex>
@@ -190,12 +187,8 @@ TEST(SimSignal, TwoWayPatternPeaksAtTheBeamCentreAndVanishesAtItsNulls)
 
 TEST(SimSignal, WindowMoveShiftsTheEchoByWholeSamples)
 {
-    CSimScene s;
-    ASSERT_TRUE(fqorvSimApplyPreset(s, "ers2", false));
-    s.mNoise = false;
-    s.mGrid = {1, 1};
+    CSimScene s = oneTarget("ers2", 290.0);
     s.mFaults.mSwstChanges = {{1800, 22}};  // 88 samples later
-    fqorvSimCompleteScene(s);
     const Sim sim(s);
     auto firstNonZero = [](const std::vector<CSimSample>& e) {
         for (std::size_t n = 0; n < e.size(); ++n)
