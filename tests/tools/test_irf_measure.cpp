@@ -1,28 +1,17 @@
 // Point-target measurement against synthetic impulse responses of known width and sidelobes.
 #include <cmath>
-#include <functional>
 #include <limits>
 
 #include <gtest/gtest.h>
 
 #include "qorv_irf_ideal.h"
 #include "qorv_irf_measure.h"
-#include "qorv_irf_report.h"
 #include "qorv_irf_truth.h"
 #include "test_irf_synthetic.h"
 
 namespace {
 
 using namespace irftest;
-
-/// Integral of f over [a, b] by Simpson's rule with n (even) intervals.
-double simpson(const std::function<double(double)>& f, double a, double b, int n)
-{
-    const double h = (b - a) / n;
-    double s = f(a) + f(b);
-    for (int i = 1; i < n; ++i) s += f(a + i * h) * (i % 2 ? 4.0 : 2.0);
-    return s * h / 3.0;
-}
 
 void expectFigures(const CIrfCut& theCut, const Figures& theExpected, double theIrwRel, double theDb,
                    const char* theWhat)
@@ -36,28 +25,26 @@ void expectFigures(const CIrfCut& theCut, const Figures& theExpected, double the
 
 Figures figuresOf(const CIrfCut& c) { return {c.mIrw, c.mPslrDb, c.mIslrDb}; }
 
+CIrfResponse analyse(const CIrfChip& theImage, double theLine, double thePixel, const CIrfOptions& theOptions = {},
+                     double theAzimuthCentre = kNaN)
+{
+    return fqorvIrfAnalyseTarget(theImage, theLine, thePixel, theOptions, theAzimuthCentre, kNaN);
+}
+
 }  // namespace
 
 // An unweighted band of half the sampling rate: |s(x)| = |sinc(x / 2)|, x in samples. Closed forms
-// for the definitions used: width 2 x 0.885893 samples at half power, PSLR -13.26 dB, and ISLR the
-// energy between the first nulls (|x| = 2) and 10 widths over the energy between the nulls.
+// for the definitions used: width 2 x 0.885893 samples at half power (sinc^2(0.4429465) = 1/2),
+// PSLR -13.26 dB, and ISLR the energy between the first nulls (|x| = 2) and 10 widths over the
+// energy between the nulls: -10.216 dB by quadrature (-9.68 dB with unbounded sidelobes).
 TEST(IrfMeasure, UnweightedBandMatchesSincClosedForms)
 {
-    const double aHalfPowerU = 0.4429465;  // sinc^2(u) = 1/2
-    const double aIrw = 4.0 * aHalfPowerU;
-    auto sinc2 = [](double u) {
-        const double s = u == 0.0 ? 1.0 : std::sin(kPi * u) / (kPi * u);
-        return s * s;
-    };
-    const double aMain = simpson(sinc2, -1.0, 1.0, 20000);
-    const double aSide = 2.0 * simpson(sinc2, 1.0, 10.0 * aIrw / 2.0, 200000);
-    const Figures aSinc{aIrw, -13.2619, 10.0 * std::log10(aSide / aMain)};
-    EXPECT_NEAR(aSinc.mIslr, -10.216, 0.001);  // (-9.68 dB with unbounded sidelobes)
+    const Figures aSinc{4.0 * 0.4429465, -13.2619, -10.216};
 
     const CIrfChip aImage = pointTarget(128, 128, 64.0, 64.3, band(0.5), 0.0, band(0.5), 0.25);
     CIrfOptions aOptions;
     aOptions.mWindow = 64;
-    const CIrfResponse r = fqorvIrfAnalyseTarget(aImage, 64.0, 64.0, aOptions, kNaN, kNaN);
+    const CIrfResponse r = analyse(aImage, 64.0, 64.0, aOptions);
     ASSERT_TRUE(r.mFound) << r.mNote;
     expectFigures(r.mRange, aSinc, 1e-3, 0.02, "range");
     expectFigures(r.mAzimuth, aSinc, 1e-3, 0.02, "azimuth");
@@ -73,17 +60,14 @@ TEST(IrfMeasure, UnweightedBandMatchesSincClosedForms)
 // azimuth over 0.8 of the PRF around the Doppler centroid, times the antenna pattern.
 TEST(IrfMeasure, KaiserBandsMatchIdealRoutineAndSimulatorTheory)
 {
-    const double ca = kCentroid / kPrf;
-    const CIrfChip aImage = pointTarget(128, 128, 60.3, 70.6, band(0.8, 2.12, antenna(kPlatformSpeed)), ca,
-                                        band(kBandwidth / kFs, 2.12), 0.0);
-    const CIrfResponse r = fqorvIrfAnalyseTarget(aImage, 60.3, 70.6, CIrfOptions{}, kNaN, kNaN);
+    const CIrfChip aImage = pointTarget(128, 128, 60.3, 70.6, ersAzimuth(), kCentroid / kPrf, ersRange(), 0.0);
+    const CIrfResponse r = analyse(aImage, 60.3, 70.6);
     ASSERT_TRUE(r.mFound) << r.mNote;
     const CIrfCut aIdealRange = fqorvIrfIdealRangeBand(kBandwidth, kFs, 16);
     const CIrfCut aIdealAz = fqorvIrfIdealAzimuth(kPrf, 0.8, kCentroid, kAntenna, kPlatformSpeed, 16);
     expectFigures(r.mRange, figuresOf(aIdealRange), 1e-3, 0.05, "range against ideal");
     expectFigures(r.mAzimuth, figuresOf(aIdealAz), 1e-3, 0.05, "azimuth against ideal");
-    EXPECT_FALSE(r.mRange.mClipped);
-    EXPECT_FALSE(r.mAzimuth.mClipped);
+    EXPECT_FALSE(r.mRange.mClipped || r.mAzimuth.mClipped);
 
     // The ideal routines against the independent program's figures.
     expectFigures(aIdealRange, kTheoryRangeKaiser, 1e-3, 0.02, "range band");
@@ -100,16 +84,13 @@ TEST(IrfMeasure, KaiserBandsMatchIdealRoutineAndSimulatorTheory)
 // Sub-sample peak positions and the peak's phase, for targets anywhere between samples.
 TEST(IrfMeasure, FractionalPositionsAndPhase)
 {
-    const double ca = kCentroid / kPrf;
     const double aPositions[][3] = {{40.0, 41.0, 0.0},   {40.37, 41.71, 1.0},  {40.5, 41.5, -2.0},
                                     {41.93, 40.06, 2.9}, {39.21, 42.44, -0.7}, {40.75, 40.25, 3.1}};
     for (const auto& p : aPositions) {
         SCOPED_TRACE(testing::Message() << "line " << p[0] << " pixel " << p[1]);
         const fcomplex aAmp = std::polar(3.0f, static_cast<float>(p[2]));
-        const CIrfChip aImage = pointTarget(96, 96, p[0], p[1], band(0.8, 2.12, antenna(kPlatformSpeed)), ca,
-                                            band(kBandwidth / kFs, 2.12), 0.0, aAmp);
-        const CIrfResponse r = fqorvIrfAnalyseTarget(aImage, std::round(p[0]) + 2, std::round(p[1]) - 3,
-                                                     CIrfOptions{}, kNaN, kNaN);
+        const CIrfChip aImage = pointTarget(96, 96, p[0], p[1], ersAzimuth(), kCentroid / kPrf, ersRange(), 0.0, aAmp);
+        const CIrfResponse r = analyse(aImage, std::round(p[0]) + 2, std::round(p[1]) - 3);
         ASSERT_TRUE(r.mFound);
         EXPECT_NEAR(r.mLine, p[0], 0.005);
         EXPECT_NEAR(r.mPixel, p[1], 0.005);
@@ -122,15 +103,12 @@ TEST(IrfMeasure, FractionalPositionsAndPhase)
 // unsquinted response.
 TEST(IrfMeasure, SquintedAzimuthSpectrumMeasuresLikeUnsquinted)
 {
-    const Weight aAz = band(0.8, 2.12, antenna(kPlatformSpeed));
-    const Weight aRg = band(kBandwidth / kFs, 2.12);
-    const CIrfResponse aRef = fqorvIrfAnalyseTarget(pointTarget(96, 96, 48.3, 47.6, aAz, 0.0, aRg, 0.0), 48, 48,
-                                                    CIrfOptions{}, kNaN, kNaN);
+    const CIrfResponse aRef = analyse(pointTarget(96, 96, 48.3, 47.6, ersAzimuth(), 0.0, ersRange(), 0.0), 48, 48);
     ASSERT_TRUE(aRef.mFound);
     for (double ca : {0.4, 0.5, 0.7, -0.45}) {
         SCOPED_TRACE(testing::Message() << "centre " << ca << " PRF");
-        const CIrfChip aImage = pointTarget(96, 96, 48.3, 47.6, aAz, ca, aRg, 0.0);
-        const CIrfResponse r = fqorvIrfAnalyseTarget(aImage, 48, 48, CIrfOptions{}, kNaN, kNaN);
+        const CIrfChip aImage = pointTarget(96, 96, 48.3, 47.6, ersAzimuth(), ca, ersRange(), 0.0);
+        const CIrfResponse r = analyse(aImage, 48, 48);
         ASSERT_TRUE(r.mFound);
         EXPECT_NEAR(std::remainder(r.mAzimuthCentre - ca, 1.0), 0.0, 0.02);
         expectFigures(r.mAzimuth, figuresOf(aRef.mAzimuth), 2e-3, 0.05, "azimuth");
@@ -140,7 +118,7 @@ TEST(IrfMeasure, SquintedAzimuthSpectrumMeasuresLikeUnsquinted)
 
         // Zeros put in the middle of the band (padding as if the spectrum were at 0) break the
         // response: the check above is not passed by accident.
-        const CIrfResponse aWrong = fqorvIrfAnalyseTarget(aImage, 48, 48, CIrfOptions{}, ca + 0.5, kNaN);
+        const CIrfResponse aWrong = analyse(aImage, 48, 48, {}, ca + 0.5);
         EXPECT_TRUE(!aWrong.mFound || std::fabs(aWrong.mAzimuth.mIrw - aRef.mAzimuth.mIrw) > 0.05 ||
                     std::fabs(aWrong.mAzimuth.mPslrDb - aRef.mAzimuth.mPslrDb) > 1.0);
     }
@@ -154,17 +132,15 @@ TEST(IrfMeasure, DegenerateCutsAndWindows)
     EXPECT_FALSE(fqorvIrfMeasureCut(aRamp, 16).mValid);
     EXPECT_FALSE(fqorvIrfMeasureCut(std::vector<double>(64, 0.0), 16).mValid);
 
-    const CIrfChip aEmpty(64, 64, 0, 0);
-    const CIrfResponse aNone = fqorvIrfAnalyseTarget(aEmpty, 32, 32, CIrfOptions{}, kNaN, kNaN);
+    const CIrfResponse aNone = analyse(CIrfChip(64, 64, 0, 0), 32, 32);
     EXPECT_FALSE(aNone.mFound);
     EXPECT_FALSE(aNone.mNote.empty());
 
     // 10 azimuth widths are about 14 lines: a 16-line window cuts them short, and says so.
-    const CIrfChip aImage = pointTarget(64, 64, 32.2, 31.9, band(0.8, 2.12, antenna(kPlatformSpeed)), 0.2,
-                                        band(0.82, 2.12), 0.0);
+    const CIrfChip aImage = pointTarget(64, 64, 32.2, 31.9, ersAzimuth(), 0.2, band(0.82, 2.12), 0.0);
     CIrfOptions aSmall;
     aSmall.mWindow = 16;
-    const CIrfResponse r = fqorvIrfAnalyseTarget(aImage, 32, 32, aSmall, kNaN, kNaN);
+    const CIrfResponse r = analyse(aImage, 32, 32, aSmall);
     ASSERT_TRUE(r.mFound);
     EXPECT_TRUE(r.mAzimuth.mClipped);
     EXPECT_NEAR(r.mAzimuth.mSidelobeExtent, 8.0, 0.1);
@@ -172,9 +148,8 @@ TEST(IrfMeasure, DegenerateCutsAndWindows)
 
     // The peak search keeps to its box: a brighter target outside it is not taken.
     CIrfChip aTwo = pointTarget(96, 96, 30.0, 30.0, band(0.8, 2.12), 0.0, band(0.82, 2.12), 0.0);
-    const CIrfChip aBright = pointTarget(96, 96, 70.0, 70.0, band(0.8, 2.12), 0.0, band(0.82, 2.12), 0.0, 5.0f);
-    for (std::size_t i = 0; i < aTwo.mData.size(); ++i) aTwo.mData[i] += aBright.mData[i];
-    const CIrfResponse aNear = fqorvIrfAnalyseTarget(aTwo, 33.0, 28.0, CIrfOptions{}, kNaN, kNaN);
+    addPointTarget(aTwo, 70.0, 70.0, band(0.8, 2.12), 0.0, band(0.82, 2.12), 0.0, 5.0f);
+    const CIrfResponse aNear = analyse(aTwo, 33.0, 28.0);
     EXPECT_NEAR(aNear.mLine, 30.0, 0.01);
     EXPECT_NEAR(aNear.mPixel, 30.0, 0.01);
 }
@@ -195,11 +170,9 @@ TEST(IrfTruth, ReadsTargetsAndChoosesThePatternVelocity)
     CJson aJson = CJson::parse(aText);
     const CIrfTruth t = fqorvIrfTruthFromJson(aJson);
     ASSERT_EQ(t.mTargets.size(), 2u);
-    EXPECT_EQ(t.mTargets[0].mId, "A");
     EXPECT_DOUBLE_EQ(t.mTargets[0].mPixel, 20.25);
     EXPECT_TRUE(t.mTargets[0].mHasPhase);
-    EXPECT_FALSE(t.mTargets[1].mIsolated);
-    EXPECT_FALSE(t.mTargets[1].mHasPhase);
+    EXPECT_FALSE(t.mTargets[1].mIsolated || t.mTargets[1].mHasPhase);
     EXPECT_NEAR(t.mPlatformVelocity, std::sqrt(5137.93 * 5137.93 + 440.0 * 440.0 + 5536.7 * 5536.7), 1e-6);
 
     const CIrfIdeal aIdeal = fqorvIrfIdealForTruth(t, 0.8, 16);
@@ -222,47 +195,4 @@ TEST(IrfTruth, ReadsTargetsAndChoosesThePatternVelocity)
     } catch (const std::runtime_error& e) {
         EXPECT_NE(std::string(e.what()).find("radar.prf"), std::string::npos) << e.what();
     }
-}
-
-// The table and the JSON report carry one row per target, the ideal and the summary.
-TEST(IrfReport, TableAndJsonCarryTargetsIdealAndSummary)
-{
-    CIrfReport aReport;
-    aReport.mSlc = "scene_slc";
-    aReport.mTruthPath = "truth.json";
-    aReport.mTruth.mPrf = kPrf;
-    aReport.mTruth.mSamplingRate = kFs;
-    aReport.mIdeal.mRange = fqorvIrfIdealRangeBand(kBandwidth, kFs, 16);
-    aReport.mIdeal.mAzimuth = fqorvIrfIdealAzimuth(kPrf, 0.8, kCentroid, 0.0, 0.0, 16);
-    aReport.mIdeal.mRangeModel = "band";
-    const CIrfChip aImage = pointTarget(64, 64, 30.25, 33.5, band(0.8, 2.12), 0.1, band(0.82, 2.12), 0.0);
-    for (const char* aId : {"P1", "P2"}) {
-        CIrfTargetResult t;
-        t.mTarget.mId = aId;
-        t.mTarget.mLine = 30.0;
-        t.mTarget.mPixel = 33.5;
-        t.mResponse = fqorvIrfAnalyseTarget(aImage, 30.0, 33.5, CIrfOptions{}, kNaN, kNaN);
-        fqorvIrfCompare(t);
-        aReport.mTargets.push_back(t);
-    }
-    aReport.mTargets[1].mResponse.mFound = false;
-    aReport.mTargets[1].mResponse.mNote = "no signal";
-
-    const std::string aTable = fqorvIrfFormatTable(aReport);
-    EXPECT_NE(aTable.find("P1"), std::string::npos);
-    EXPECT_NE(aTable.find("P2"), std::string::npos);
-    EXPECT_NE(aTable.find("no signal"), std::string::npos);
-    EXPECT_NE(aTable.find("ideal"), std::string::npos);
-    EXPECT_NE(aTable.find("measured 1 of 2 targets"), std::string::npos) << aTable;
-
-    const CJson j = CJson::parse(fqorvIrfReportJson(aReport).dump());
-    ASSERT_EQ(j["targets"].size(), 2u);
-    const CJson& aFirst = j["targets"].elements()[0];
-    const CJson& aSecond = j["targets"].elements()[1];
-    EXPECT_NEAR(aFirst["line_error"].number(), 0.25, 0.005);
-    EXPECT_NEAR(aFirst["azimuth_centre_hz"].number(), 0.1 * kPrf, 0.02 * kPrf);
-    EXPECT_FALSE(aSecond["found"].boolean());
-    EXPECT_EQ(j["summary"]["measured"].number(), 1.0);
-    EXPECT_NEAR(j["ideal"]["range"]["irw"].number(), aReport.mIdeal.mRange.mIrw, 1e-12);
-    EXPECT_NEAR(j["summary"]["max_line_error"].number(), 0.25, 0.005);
 }

@@ -34,26 +34,15 @@ inline const Figures kTheoryAzimuthCentre{1.3853841790196144, -25.84059624835628
 
 using Weight = std::function<double(double)>;
 
-/// I0 by its power series in long double: the tests' window stays apart from the focuser's.
-inline double seriesI0(double x)
-{
-    const long double q = static_cast<long double>(x) * x / 4.0L;
-    long double aSum = 1.0L, aTerm = 1.0L;
-    for (int k = 1; k < 5000 && aTerm > aSum * 1e-22L; ++k) {
-        aTerm *= q / (static_cast<long double>(k) * k);
-        aSum += aTerm;
-    }
-    return static_cast<double>(aSum);
-}
-
-/// Spectral weight of a band theWidth cycles per sample wide, [-w/2, w/2), optionally Kaiser.
+/// Spectral weight of a band theWidth cycles per sample wide, [-w/2, w/2), optionally Kaiser (with
+/// the standard library's I0: the tests' window stays apart from the focuser's).
 inline Weight band(double theWidth, double theBeta = 0.0, Weight theShape = {})
 {
-    const double aI0Beta = seriesI0(theBeta);
+    const double aI0Beta = std::cyl_bessel_i(0.0, theBeta);
     return [=](double f) {
         const double x = 2.0 * f / theWidth;
         if (x < -1.0 || x >= 1.0) return 0.0;
-        double w = theBeta > 0.0 ? seriesI0(theBeta * std::sqrt(1.0 - x * x)) / aI0Beta : 1.0;
+        double w = theBeta > 0.0 ? std::cyl_bessel_i(0.0, theBeta * std::sqrt(1.0 - x * x)) / aI0Beta : 1.0;
         if (theShape) w *= theShape(f);
         return w;
     };
@@ -68,6 +57,11 @@ inline Weight antenna(double theSpeed)
         return s * s;
     };
 }
+
+/// The chain's weights in the ERS-like scene: azimuth Kaiser over 0.8 of the PRF times the
+/// antenna pattern, range Kaiser over the chirp's band.
+inline Weight ersAzimuth() { return band(0.8, 2.12, antenna(kPlatformSpeed)); }
+inline Weight ersRange() { return band(kBandwidth / kFs, 2.12); }
 
 /// Samples 0 .. n-1 of the continuous response of a band: s(x) = integral of W(f - c)
 /// exp(j 2 pi f (x - x0)) df over c +- 1/2 cycle per sample (midpoint rule, 8192 steps), so that

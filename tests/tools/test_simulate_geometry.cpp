@@ -1,6 +1,6 @@
-// The simulator's geometry against closed forms: straight-line and circular range histories,
-// Doppler sign and centroid, zero-Doppler and beam-centre times, effective velocity, the ground
-// point of a zero-Doppler time and range, orbit placement, dates and the pulse timeline.
+// The simulator's geometry against closed forms: range histories, Doppler, beam-centre times,
+// effective velocity, orbit placement and the ground point of a zero-Doppler time and range;
+// dates and the pulse timeline.
 #include <cmath>
 
 #include <gtest/gtest.h>
@@ -62,15 +62,9 @@ TEST(SimGeometry, CircularOrbitEffectiveVelocityIsSqrtOfSatelliteTimesGroundVelo
     // Equatorial circular orbit, Earth not rotating: inertial = Earth-fixed, S = a (cos nt, sin nt, 0).
     CSimKepler k;
     k.mA = 7150000.0;
-    k.mE = 0.0;
-    k.mInc = 0.0;
-    k.mRaan = 0.0;
-    k.mArgp = 0.0;
-    k.mM0 = 0.0;
-    k.mOmegaEarth = 0.0;
+    k.mE = k.mInc = k.mArgp = k.mOmegaEarth = 0.0;
     const CSimKeplerOrbit aOrbit(k);
     const double n = std::sqrt(k.mMu / (k.mA * k.mA * k.mA));
-    EXPECT_NEAR(aOrbit.state(123.0).mPos.norm(), k.mA, 1e-6);
     EXPECT_NEAR(aOrbit.state(123.0).mVel.norm(), n * k.mA, 1e-6);
     const double d = 6370000.0, phi = 0.01;
     const CSimVec3 P{d * std::cos(phi), d * std::sin(phi), 0.0};
@@ -144,26 +138,14 @@ TEST(SimGeometry, PlacedOrbitSeesTheCentreAndLocateInvertsZeroDopplerGeometry)
     }
 }
 
-TEST(SimGeodesy, EllipsoidRoundTripDatesAndGreenwichAngle)
+TEST(SimGeodesy, DatesAndGreenwichAngle)
 {
-    for (const CSimEllipsoid e : {CQORV_SIM_WGS84, CSimEllipsoid{6378144.0, 6356755.0}})
-        for (double lat : {-89.9, -41.0, 0.0, 23.5, 78.0})
-            for (double h : {-50.0, 0.0, 3000.0, 785000.0}) {
-                const CSimVec3 p = fqorvSimGeodeticToEcef(e, lat * CQORV_SIM_DEG, 2.1, h);
-                double la, lo, hh;
-                fqorvSimEcefToGeodetic(e, p, la, lo, hh);
-                EXPECT_NEAR(la / CQORV_SIM_DEG, lat, 1e-10);
-                EXPECT_NEAR(lo, 2.1, 1e-12);
-                EXPECT_NEAR(hh, h, 1e-6);
-            }
-
     CSimUtc u;
     ASSERT_TRUE(fqorvSimParseIsoDate("1999-12-31T23:59:59.9999996", u));
     EXPECT_EQ(fqorvSimHeaderDate(u), "01-JAN-2000 00:00:00.000000");  // the carry reaches the year
     ASSERT_TRUE(fqorvSimParseIsoDate("1997-03-15T09:41:27.25", u));
     EXPECT_EQ(fqorvSimHeaderDate(u.plus(-1.060841110570121)), "15-MAR-1997 09:41:26.189159");
     EXPECT_EQ(fqorvSimHeaderDate(u.plus(-86400.0 * 15)), "28-FEB-1997 09:41:27.250000");
-    EXPECT_EQ(fqorvSimIsoDate(u), "1997-03-15T09:41:27.250000");
     EXPECT_EQ(u.mDay, 9935);  // days since 1970-01-01
     EXPECT_FALSE(fqorvSimParseIsoDate("1997-13-15T09:41:27", u));
     EXPECT_FALSE(fqorvSimParseIsoDate("15-MAR-1997 09:41:27", u));
@@ -194,28 +176,19 @@ TEST(SimTimeline, PulseTimesRecordsAndCodesFollowTheFaults)
     const CSimTimeline tl(s);
 
     const double aPri0 = 2822 * 210.94e-9, aPri1 = 2802 * 210.94e-9;
-    EXPECT_NEAR(s.mRadar.mPrf, 1679.9024, 1e-4);
     EXPECT_NEAR(tl.pulseTime(9), 10.0 + 9 * aPri0, 1e-12);
     EXPECT_NEAR(tl.pulseTime(17), 10.0 + 10 * aPri0 + 7 * aPri1, 1e-12);
-    EXPECT_EQ(tl.priCode(9), 2820);
-    EXPECT_EQ(tl.priCode(10), 2800);
     EXPECT_NEAR(tl.fractionalPulse(tl.pulseTime(17) + 0.25 * aPri1), 17.25, 1e-9);
     EXPECT_NEAR(tl.timeOfPulse(3.5), 10.0 + 3.5 * aPri0, 1e-12);
     EXPECT_NEAR(tl.fractionalPulse(9.0), -1.0 / aPri0, 1e-6);  // extended before the first pulse
 
-    EXPECT_EQ(tl.swstCode(19), 1200);
-    EXPECT_EQ(tl.swstCode(20), 1222);
-    EXPECT_EQ(tl.windowShiftSamples(22), 88);
+    // The window moves up 22 codes and then down 44: 88 samples earlier than at first.
     EXPECT_EQ(tl.swstCode(25), 1178);
     EXPECT_NEAR(tl.windowDelay(26), 5.6e-3 - 88 / 18.96e6, 1e-15);
 
-    // 40 pulses, 3 dropped, 1 repeated.
+    // 40 pulses, 3 dropped, 1 repeated; the counter wraps: 4294967290 + 7 is 1.
     ASSERT_EQ(tl.records().size(), 38u);
-    std::vector<uint32_t> aCounters;
-    for (const CSimRecord& r : tl.records()) aCounters.push_back(r.mCounter - 4294967290u);
-    const std::vector<uint32_t> aHead{0, 1, 2, 3, 4, 7, 8, 9, 9, 10};
-    EXPECT_EQ(std::vector<uint32_t>(aCounters.begin(), aCounters.begin() + 10), aHead);
-    EXPECT_EQ(tl.records()[5].mCounter, 1u);  // 4294967290 + 7 wraps to 1
+    EXPECT_EQ(tl.records()[5].mCounter, 1u);
     EXPECT_TRUE(tl.records()[8].mRepeat);
     EXPECT_EQ(tl.recordOfPulse(6), -1);
     EXPECT_EQ(tl.recordOfPulse(10), 9);

@@ -1,8 +1,7 @@
 // The outside check: a raw scene written by an independent simulator (shared/scenes/
 // ers-points-small), read with the project's store and raster classes, against this simulator run
-// with the same parameters (its truth file read as a scene). Geometry: orbit, zero-Doppler times,
-// ranges, expected lines and pixels. Signal: amplitude, carrier phase and Doppler sign, by the
-// normalised correlation of the echoes and by the Doppler centroid of adjacent-line correlation.
+// with the same parameters (its truth file read as a scene): geometry, amplitude, carrier phase and
+// Doppler sign.
 #include <cmath>
 #include <complex>
 #include <filesystem>
