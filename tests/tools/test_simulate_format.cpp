@@ -108,9 +108,13 @@ TEST(SimFormat, PrefixFieldsStandBigEndianAtTheSensorsPositions)
         fqorvSimEncodePrefix(p, v, 1, 11, b.data());
         const std::vector<uint8_t> aCounter{1, 2, 3, 4};
         EXPECT_EQ(std::vector<uint8_t>(a.begin() + c.mCounter, a.begin() + c.mCounter + 4), aCounter) << c.mPreset;
-        if (c.mSwst >= 0) EXPECT_EQ(static_cast<int16_t>(fqorvSimGetBE16(&a[c.mSwst])), -2);
+        if (c.mSwst >= 0) {
+            EXPECT_EQ(static_cast<int16_t>(fqorvSimGetBE16(&a[c.mSwst])), -2);
+        }
         EXPECT_EQ(a[c.mPri] * 256 + a[c.mPri + 1], 2820);
-        if (c.mRange >= 0) EXPECT_EQ(fqorvSimGetBE32(&a[c.mRange]), 852345u);
+        if (c.mRange >= 0) {
+            EXPECT_EQ(fqorvSimGetBE32(&a[c.mRange]), 852345u);
+        }
         // The other bytes are noise, different in every record.
         int aSame = 0;
         for (std::size_t i = 0; i < a.size(); ++i) aSame += a[i] == b[i];
