@@ -166,18 +166,20 @@ void scaleRecords(const CRasterFileParam& p, double theFactor)
     std::vector<unsigned char> aBuffer(aRecord * static_cast<std::size_t>(aChunk));
     const bool aSwap = p.mByteOrderMSBF;  // the machine is little-endian
     std::vector<float> aParts(2 * aCells);  // one record's cells, real and imaginary parts
+    const auto fail = [&](int theId, const char* theVerb, int theRecord) {
+        const int e = errno;
+        close(aFd);
+        const std::string aText = fqorvStringFormat("Error: impossible to %s record %d  on file %s  errno = %d", theVerb,
+                                                    theRecord, p.mFileName.c_str(), e);
+        fdfTrace("%s\n", aText.c_str());
+        QORV_FATAL(theId, aText.c_str());
+    };
     CScaleProgress aProgress;
     for (int r = 0; r < p.mNrOfLinesPerImage; r += aChunk) {
         const int n = std::min(aChunk, p.mNrOfLinesPerImage - r);
         const std::size_t aBytes = aRecord * static_cast<std::size_t>(n);
         const off_t aAt = static_cast<off_t>(p.mHeaderLen) + static_cast<off_t>(aRecord) * r;
-        if (pread(aFd, aBuffer.data(), aBytes, aAt) != static_cast<ssize_t>(aBytes)) {
-            const int e = errno;
-            close(aFd);
-            fdfTrace("Error: impossible to read record %d  on file %s  errno = %d\n", r, p.mFileName.c_str(), e);
-            QORV_FATAL(CQORV_ERR_RASTER_READ, fqorvStringFormat("Error: impossible to read record %d  on file %s  errno = %d",
-                                                                r, p.mFileName.c_str(), e).c_str());
-        }
+        if (pread(aFd, aBuffer.data(), aBytes, aAt) != static_cast<ssize_t>(aBytes)) fail(CQORV_ERR_RASTER_READ, "read", r);
         for (int k = 0; k < n; ++k) {
             unsigned char* aCells = aBuffer.data() + aRecord * static_cast<std::size_t>(k) + static_cast<std::size_t>(p.mRowPrefix);
             std::memcpy(aParts.data(), aCells, aParts.size() * sizeof(float));
@@ -186,13 +188,7 @@ void scaleRecords(const CRasterFileParam& p, double theFactor)
             if (aSwap) swapParts(aParts);
             std::memcpy(aCells, aParts.data(), aParts.size() * sizeof(float));
         }
-        if (pwrite(aFd, aBuffer.data(), aBytes, aAt) != static_cast<ssize_t>(aBytes)) {
-            const int e = errno;
-            close(aFd);
-            fdfTrace("Error: impossible to write record %d  on file %s  errno = %d\n", r, p.mFileName.c_str(), e);
-            QORV_FATAL(CQORV_ERR_WRITE_FILE, fqorvStringFormat("Error: impossible to write record %d  on file %s  errno = %d",
-                                                               r, p.mFileName.c_str(), e).c_str());
-        }
+        if (pwrite(aFd, aBuffer.data(), aBytes, aAt) != static_cast<ssize_t>(aBytes)) fail(CQORV_ERR_WRITE_FILE, "write", r);
         aProgress.at(r + n, p.mNrOfLinesPerImage);
     }
     if (close(aFd) != 0) QORV_FATAL(CQORV_ERR_WRITE_FILE, p.mFileName.c_str());
