@@ -11,6 +11,8 @@
 #include <fstream>
 #include <sstream>
 
+#include "qorv_generic_utility.h"
+
 namespace qfocus {
 
 namespace {
@@ -28,12 +30,9 @@ std::string readText(const fs::path& thePath)
     return s.str();
 }
 
-bool writeText(const fs::path& thePath, const std::string& theText)
-{
-    std::ofstream f(thePath, std::ios::binary | std::ios::trunc);
-    f << theText;
-    return static_cast<bool>(f.flush());
-}
+/// Whole-file writes replace the file at once: the driver polls the working file and must never
+/// read it half-written.
+bool writeText(const fs::path& thePath, const std::string& theText) { return fqorvWriteTextAtomically(thePath.string(), theText); }
 
 /// The value of the header row that follows the row holding theKey (user keys are rows of
 /// key and value).

@@ -26,9 +26,8 @@ TEST(DopplerAmbiguity, TheMissingPrfCyclesAreFoundAndAddedToTheHeader)
         const double aPrf = 1679.9023936391638;
         const std::vector<std::string> aScene = {
             "--preset", "ers2", "--lines", "2048", "--samples", "1024", "--targets", "grid:3x3", "--scatterers", "400",
-            "--doppler-centroid", std::to_string(aBaseband + aCycles * aPrf), "--quiet", "--out", aRaw.string(), "--config",
-            aBox.etc().string()};
-        ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+            "--doppler-centroid", std::to_string(aBaseband + aCycles * aPrf)};
+        ASSERT_EQ(aBox.simulate(aRaw.string(), aScene).mStatus, 0);
         const CJson aTruth = CJson::parseFile(aRaw.string() + "_truth.json");
         ASSERT_NEAR(aTruth["radar"]["prf"].number(), aPrf, 1e-6);
         {  // the header holds the baseband centroid, as an estimate from the echoes would

@@ -23,9 +23,8 @@ TEST(Autofocus, ThreeRunsBringTheVelocityWithinTwoPerMilleOfTheTruth)
         qtest::DriverSandbox aBox;
         const fs::path aRaw = aBox.data() / "scene_raw";
         const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "4096", "--samples", "1280", "--targets", "grid:3x3",
-                                                 "--scatterers", "800", "--write-doppler", "--quiet", "--out", aRaw.string(),
-                                                 "--config", aBox.etc().string()};
-        ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+                                                 "--scatterers", "800", "--write-doppler"};
+        ASSERT_EQ(aBox.simulate(aRaw.string(), aScene).mStatus, 0);
         const double aTrue = CJson::parseFile(aRaw.string() + "_truth.json")["velocity"]["true_processing_velocity"].number();
         {
             qtest::InProcessEnvironment aEnv;

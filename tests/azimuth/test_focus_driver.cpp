@@ -92,11 +92,8 @@ void fWriteRangeCompressed(const std::filesystem::path& theRaw, const std::files
 std::vector<std::string> fSimulateAndFocus(qtest::DriverSandbox& theBox, std::vector<std::string> theScene)
 {
     const auto aRaw = theBox.data() / "ers_raw";
-    for (const char* a : {"--write-doppler", "--no-noise", "--quiet", "--out"}) theScene.push_back(a);
-    theScene.push_back(aRaw.string());
-    theScene.push_back("--config");
-    theScene.push_back(theBox.etc().string());
-    const qtest::RunResult aSim = qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", theScene, {}, theBox.data());
+    theScene.insert(theScene.end(), {"--write-doppler", "--no-noise"});
+    const qtest::RunResult aSim = theBox.simulate(aRaw, theScene);
     EXPECT_EQ(aSim.mStatus, 0) << aSim.mStderr;
     {
         qtest::InProcessEnvironment aEnv;

@@ -62,9 +62,8 @@ TEST(ChainProducts, GdalReadsEveryProductAsTheChainWroteIt)
 {
     qtest::DriverSandbox aBox;
     const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "3072", "--samples", "1280", "--targets", "grid:2x2",
-                                             "--write-doppler", "--quiet", "--out", (aBox.data() / "scene_raw").string(),
-                                             "--config", aBox.etc().string()};
-    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+                                             "--write-doppler"};
+    ASSERT_EQ(aBox.simulate((aBox.data() / "scene_raw").string(), aScene).mStatus, 0);
     auto aArgs = qtest::DriverSandbox::defaultArguments(aBox.data() / "scene_raw", aBox.data() / "scene_slc");
     aArgs[5] = aArgs[6] = "OK";    // multi-look and TIFF
     aArgs[15] = aArgs[17] = "OK";  // no Doppler estimation, no autofocus
@@ -117,9 +116,8 @@ TEST(ChainProducts, TheOperatorsStopEndsEachLongStepWithoutAProduct)
 {
     qtest::DriverSandbox aBox;
     const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "2048", "--samples", "1024", "--targets", "grid:1x1",
-                                             "--write-doppler", "--quiet", "--out", (aBox.data() / "scene_raw").string(),
-                                             "--config", aBox.etc().string()};
-    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+                                             "--write-doppler"};
+    ASSERT_EQ(aBox.simulate((aBox.data() / "scene_raw").string(), aScene).mStatus, 0);
     auto aArgs = qtest::DriverSandbox::defaultArguments(aBox.data() / "scene_raw", aBox.data() / "scene_slc");
     aArgs[5] = "OK";
     aArgs[15] = aArgs[17] = "OK";
@@ -158,9 +156,8 @@ TEST(ChainProducts, AListOfProductsTakesTheEstimatesOfItsFirstProductAndStopsAtA
     const fs::path aScene = aBox.data() / "scene";
     const std::vector<std::string> aArgsSim = {"--preset", "ers2", "--lines", "2048", "--samples", "1024", "--targets", "grid:2x2",
                                                "--scatterers", "3000", "--scatterer-rms", "0.3", "--scatterer-margin", "1300",
-                                               "--velocity-error", "0.01", "--quiet", "--out", aScene.string(), "--config",
-                                               aBox.etc().string()};
-    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aArgsSim, {}, aBox.data()).mStatus, 0);
+                                               "--velocity-error", "0.01"};
+    ASSERT_EQ(aBox.simulate(aScene.string(), aArgsSim).mStatus, 0);
     std::string aList;
     for (const char* aName : {"a_raw", "b_raw"}) {
         fs::copy_file(aScene, aBox.data() / aName);

@@ -67,9 +67,8 @@ TEST(DopplerEstimation, TheTableGivesTheCentroidBackAcrossTheBand)
 {
     qtest::DriverSandbox aBox;
     const fs::path aRoot = aBox.data() / "clutter";
-    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "256", "--samples", "1024", "--targets", "grid:1x1",
-                                             "--quiet", "--out", aRoot.string(), "--config", aBox.etc().string()};
-    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "256", "--samples", "1024", "--targets", "grid:1x1"};
+    ASSERT_EQ(aBox.simulate(aRoot.string(), aScene).mStatus, 0);
     qtest::InProcessEnvironment aEnv;
     const double aPrf = [&] {
         auto h = CDescriptionHeader::makeFull();
@@ -121,10 +120,9 @@ TEST(DopplerEstimation, TheWholeChainFromRawDataAndHeaderAloneFindsDopplerAndVel
         std::vector<std::string> aScene = {"--preset", c.mPreset, "--lines", "4096", "--samples", "1024", "--targets",
                                            "grid:2x2", "--scatterers", c.mScatterers, "--scatterer-rms", "0.3",
                                            "--scatterer-margin", c.mMargin, "--pattern-extent", c.mExtent,
-                                           "--velocity-error", c.mVelocityError, "--quiet", "--out", aRaw.string(),
-                                           "--config", aBox.etc().string()};
+                                           "--velocity-error", c.mVelocityError};
         if (*c.mCentroid) aScene.insert(aScene.end(), {"--doppler-centroid", c.mCentroid});
-        ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+        ASSERT_EQ(aBox.simulate(aRaw.string(), aScene).mStatus, 0);
         auto aArgs = qtest::DriverSandbox::defaultArguments(aRaw, aBox.data() / "scene_slc");
         aArgs[10] = "OK";        // steps 0, 1, 2, 4, 3, 3, 3 and 5
         aArgs.push_back("0");    // one centroid per range position for a scene shorter than a block
@@ -146,7 +144,9 @@ TEST(DopplerEstimation, TheWholeChainFromRawDataAndHeaderAloneFindsDopplerAndVel
         const double aEstimated = aPar["sar_processing.Velocity"].getDouble();
         std::printf("%s: Doppler %.2f Hz (truth %.2f), velocity %.3f m/s (truth %.3f)\n", c.mPreset,
                     aSar.getDopplerFromPixel(512, 2048, false, false), aCentroid, aEstimated, aVelocity);
-        if (!c.mLongAperture) EXPECT_LT(std::fabs(aEstimated / aVelocity - 1.0), 0.002) << aEstimated << " against " << aVelocity;
+        if (!c.mLongAperture) {
+            EXPECT_LT(std::fabs(aEstimated / aVelocity - 1.0), 0.002) << aEstimated << " against " << aVelocity;
+        }
 
         // Clutter and noise mask the sidelobes, so the targets are measured on the same scene
         // without them, focused with the chain's estimates: the raw header takes the Doppler table
@@ -155,10 +155,9 @@ TEST(DopplerEstimation, TheWholeChainFromRawDataAndHeaderAloneFindsDopplerAndVel
         const fs::path aClean = aBox.data() / "clean_raw";
         std::vector<std::string> aCleanScene = {"--preset", c.mPreset, "--lines", c.mLongAperture ? "8192" : "4096",
                                                 "--samples", c.mLongAperture ? "2048" : "1024", "--targets", "grid:2x2",
-                                                "--velocity-error", c.mVelocityError, "--no-noise", "--quiet", "--out",
-                                                aClean.string(), "--config", aBox.etc().string()};
+                                                "--velocity-error", c.mVelocityError, "--no-noise"};
         if (*c.mCentroid) aCleanScene.insert(aCleanScene.end(), {"--doppler-centroid", c.mCentroid});
-        ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aCleanScene, {}, aBox.data()).mStatus, 0);
+        ASSERT_EQ(aBox.simulate(aClean.string(), aCleanScene).mStatus, 0);
         {
             auto aFrom = CDescriptionHeader::makeFull(), aTo = CDescriptionHeader::makeFull();
             ASSERT_TRUE(aFrom->read((aRaw.string() + "_hdr").c_str(), true));
@@ -217,9 +216,8 @@ TEST(DopplerEstimation, DataThatGiveNoEstimateFailStepOneAndKeepTheHeadersDopple
         qtest::DriverSandbox aBox;
         const fs::path aRaw = aBox.data() / "scene_raw";
         const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", std::to_string(c.mLines), "--samples", "768",
-                                                 "--scatterers", "500", "--write-doppler", "--quiet", "--out",
-                                                 aRaw.string(), "--config", aBox.etc().string()};
-        ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+                                                 "--scatterers", "500", "--write-doppler"};
+        ASSERT_EQ(aBox.simulate(aRaw.string(), aScene).mStatus, 0);
         if (c.mBlank) fBlankEchoes(aRaw, c.mLines, 768);
         auto aArgs = qtest::DriverSandbox::defaultArguments(aRaw, aBox.data() / "scene_slc");
         aArgs[17] = "OK";  // steps 0, 1, 2 and 5
@@ -246,9 +244,8 @@ TEST(DopplerEstimation, AHeaderWithoutDopplerIsFocusedAtZeroWithAWarning)
 {
     qtest::DriverSandbox aBox;
     const fs::path aRaw = aBox.data() / "scene_raw";
-    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "256", "--samples", "768", "--targets", "grid:1x1",
-                                             "--quiet", "--out", aRaw.string(), "--config", aBox.etc().string()};
-    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "256", "--samples", "768", "--targets", "grid:1x1"};
+    ASSERT_EQ(aBox.simulate(aRaw.string(), aScene).mStatus, 0);
     auto aArgs = qtest::DriverSandbox::defaultArguments(aRaw, aBox.data() / "scene_slc");
     aArgs[15] = aArgs[17] = "OK";  // steps 0, 2 and 5
     const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aArgs), {}, 300);

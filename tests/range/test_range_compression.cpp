@@ -135,11 +135,8 @@ TEST(LineContinuity, SamplingWindowChangesBecomeRangeShifts)
 /// runs steps 0, 2 and 5 into data/scene_rc and data/scene_slc. Returns the run's status.
 qtest::RunResult fSimulateAndRun(qtest::DriverSandbox& theBox, std::vector<std::string> theScene)
 {
-    for (const char* a : {"--write-doppler", "--no-noise", "--quiet", "--out"}) theScene.push_back(a);
-    theScene.push_back((theBox.data() / "raw").string());
-    theScene.push_back("--config");
-    theScene.push_back(theBox.etc().string());
-    const qtest::RunResult aSim = qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", theScene, {}, theBox.data());
+    theScene.insert(theScene.end(), {"--write-doppler", "--no-noise"});
+    const qtest::RunResult aSim = theBox.simulate(theBox.data() / "raw", theScene);
     EXPECT_EQ(aSim.mStatus, 0) << aSim.mStderr;
     auto aArgs = qtest::DriverSandbox::defaultArguments(theBox.data() / "raw", theBox.data() / "scene_slc");
     aArgs[15] = aArgs[17] = "OK";  // no Doppler estimation, no autofocus
@@ -310,9 +307,8 @@ TEST(RangeCompressionDriver, SceneCoordinatesMissingFromTheHeaderComeFromTheOrbi
 {
     qtest::DriverSandbox aBox;
     const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "1024", "--samples", "1024", "--targets", "grid:1x1",
-                                             "--write-doppler", "--quiet", "--out", (aBox.data() / "raw").string(), "--config",
-                                             aBox.etc().string()};
-    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+                                             "--write-doppler"};
+    ASSERT_EQ(aBox.simulate((aBox.data() / "raw").string(), aScene).mStatus, 0);
     const double aLat = CJson::parseFile((aBox.data() / "raw_truth.json").string())["scene_centre"]["lat"].number();
     fDropHeaderLines(aBox.data() / "raw", "<LatNorthing>");
     auto aArgs = qtest::DriverSandbox::defaultArguments(aBox.data() / "raw", aBox.data() / "scene_slc");
@@ -334,9 +330,8 @@ TEST(RangeCompressionDriver, ThePrefilterRoadDecimatesAndKeepsTheRangeResponse)
     // around the Doppler centroid; a target's range cut at its beam-centre time is unchanged.
     qtest::DriverSandbox aBox;
     const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "2048", "--samples", "1280", "--targets", "grid:2x2",
-                                             "--write-doppler", "--no-noise", "--quiet", "--out", (aBox.data() / "raw").string(),
-                                             "--config", aBox.etc().string()};
-    ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+                                             "--write-doppler", "--no-noise"};
+    ASSERT_EQ(aBox.simulate((aBox.data() / "raw").string(), aScene).mStatus, 0);
     {
         qtest::InProcessEnvironment aEnv;
         CDescriptionHeader p({"sar_processing"});
@@ -405,8 +400,7 @@ void fWriteParameters(const qtest::DriverSandbox& theBox, const char* theChannel
 TEST(RangeCompressionDriver, BadInputEndsWithItsFailureAndNoProduct)
 {
     qtest::DriverSandbox aBox;
-    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "1024", "--samples", "1024", "--targets", "grid:1x1",
-                                             "--quiet", "--out", (aBox.data() / "raw").string(), "--config", aBox.etc().string()};
+    const std::vector<std::string> aScene = {"--preset", "ers2", "--lines", "1024", "--samples", "1024", "--targets", "grid:1x1"};
     auto aArgs = qtest::DriverSandbox::defaultArguments(aBox.data() / "raw", aBox.data() / "scene_slc");
     aArgs[15] = aArgs[17] = "OK";
     struct CCase {
@@ -436,7 +430,7 @@ TEST(RangeCompressionDriver, BadInputEndsWithItsFailureAndNoProduct)
         SCOPED_TRACE(c.mName);
         fs::remove_all(aBox.data());
         fs::create_directories(aBox.data());
-        ASSERT_EQ(qtest::runProgram(qtest::binaryDir() / "qorvex_simulate", aScene, {}, aBox.data()).mStatus, 0);
+        ASSERT_EQ(aBox.simulate(aRaw, aScene).mStatus, 0);
         std::vector<std::string> aCaseArgs = aArgs;
         c.mBreak(aCaseArgs);
         const qtest::RunResult aRun = aBox.run(aBox.writeArguments(aCaseArgs), {}, 300);

@@ -236,6 +236,13 @@ fs::path DriverSandbox::writeArguments(const std::vector<std::string>& theArgs, 
     return aPath;
 }
 
+RunResult DriverSandbox::simulate(const fs::path& theRaw, std::vector<std::string> theOptions) const
+{
+    for (const std::string& a : {std::string("--quiet"), std::string("--out"), theRaw.string(), std::string("--config"), etc().string()})
+        theOptions.push_back(a);
+    return runProgram(binaryDir() / "qorvex_simulate", theOptions, {}, data());
+}
+
 RunResult DriverSandbox::run(const fs::path& theArgumentsFile, std::map<std::string, std::string> theEnv,
                              int theTimeoutSeconds) const
 {

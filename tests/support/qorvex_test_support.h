@@ -120,6 +120,8 @@ public:
     /// Runs the driver with the arguments file; extra environment on top of QORVEX_INIT_DIR.
     RunResult run(const fs::path& theArgumentsFile, std::map<std::string, std::string> theEnv = {},
                   int theTimeoutSeconds = 300) const;
+    /// Runs qorvex_simulate with theOptions, writing theRaw quietly with this sandbox's configuration.
+    RunResult simulate(const fs::path& theRaw, std::vector<std::string> theOptions) const;
     std::string trace() const { return readFile(work() / "Process.trace"); }
     std::string log() const { return readFile(work() / "Process.log"); }
 
