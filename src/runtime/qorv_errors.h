@@ -42,12 +42,26 @@ inline constexpr int CQORV_ERR_INDEX_RANGE = 848646;            // index out of 
 inline constexpr int CQORV_ERR_CATCH_ALL = 913920;              // exception in a catch-all handler
 inline constexpr int CQORV_ERR_RASTER_EXCEPTION = 913921;       // exception in raster input or output
 inline constexpr int CQORV_ERR_MAP_ENVIRONMENT = 913922;        // failure in the map code's environment
+inline constexpr int CQORV_ERR_IMPORT_UNKNOWN_INPUT = 979201;    // not a raw archive of a known format
+inline constexpr int CQORV_ERR_IMPORT_LEADER = 979202;           // leader file missing or of another kind
+inline constexpr int CQORV_ERR_IMPORT_RECORD_LENGTH = 979203;    // record lengths contradict the descriptor
+inline constexpr int CQORV_ERR_IMPORT_LAYOUT = 979204;           // facility layout of the records not recognised
+inline constexpr int CQORV_ERR_IMPORT_CODE_RANGE = 979205;       // a PRI or SWST code out of range
+inline constexpr int CQORV_ERR_IMPORT_TIME_ORDER = 979206;       // times go backwards
+inline constexpr int CQORV_ERR_IMPORT_ORBIT_COVERAGE = 979207;   // the orbit does not cover the scene
+inline constexpr int CQORV_ERR_IMPORT_OPTION = 979208;           // an option does not apply to this input
+inline constexpr int CQORV_ERR_IMPORT_NO_LINES = 979209;         // the input holds no whole line
+inline constexpr int CQORV_ERR_IMPORT_VALUE = 979210;            // a value of the archive missing or impossible
+inline constexpr int CQORV_ERR_IMPORT_ORBIT_FILE = 979211;       // the orbit file cannot be read
 inline constexpr int CQORV_WARNINGS_PSEUDO_ID = 65280;          // a run that ended with warnings
 
 // Warning ids, numbered in the warning catalogue.
 inline constexpr int CQORV_WARN_65281 = 65281;
 inline constexpr int CQORV_WARN_COORDINATES = 65283;           // scene coordinates missing, derived instead
 inline constexpr int CQORV_WARN_130561 = 130561;
+inline constexpr int CQORV_WARN_IMPORT_TRUNCATED = 195841;     // data file truncated, its whole lines imported
+inline constexpr int CQORV_WARN_IMPORT_ONE_VECTOR = 195842;    // orbit propagated from a single state vector
+inline constexpr int CQORV_WARN_IMPORT_CLOCK = 195843;         // on-board clock off the scene time
 
 inline constexpr int CQORV_MAX_LINE_IN_ERROR = 3;
 inline constexpr int CQORV_MAX_LEN_IN_ERROR = 48;

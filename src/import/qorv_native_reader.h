@@ -1,0 +1,50 @@
+// The readers of native ERS raw archives: recognition by content, the descriptors and headers of
+// each format into a CNativeArchive, and the line records of the data file, walked by their own
+// length fields.
+//
+// Formats: ERS CEOS (a leader file and a data file, several facilities' variants of the record
+// layout) and ERS level 0 in the ENVISAT format (.E1/.E2: main and specific product headers, data
+// set descriptors, one data set record per line).
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <filesystem>
+#include <functional>
+#include <vector>
+
+#include "qorv_native_archive.h"
+
+/// Recognises theInput by its content (a CEOS product directory, its data or its leader file, or
+/// an ENVISAT-format file; the names do not matter) and reads its headers. Throws CImportFailure:
+/// 261122 when theInput does not exist, 979201 for anything that is not one of the formats (with
+/// the words of what it seems to be: ENVISAT ASAR or ALOS PALSAR are named as not imported yet),
+/// 979202 for a CEOS data file without an ERS leader beside it, 979203 for record lengths that
+/// contradict the file descriptor, 979204 for a record layout of no known facility, 979206 for
+/// state vectors whose times go backwards, 979210 for a missing or impossible value.
+CNativeArchive fqorvReadNativeArchive(const std::filesystem::path& theInput);
+
+/// The line records of an archive's data file, opened read-only.
+class CNativeRecordFile {
+public:
+    /// Opens the layout's data file; CImportFailure 261122 when it can't be opened.
+    explicit CNativeRecordFile(const CNativeRecordLayout& theLayout);
+    ~CNativeRecordFile();
+    CNativeRecordFile(const CNativeRecordFile&) = delete;
+    CNativeRecordFile& operator=(const CNativeRecordFile&) = delete;
+
+    /// The codes of every whole record, walking record by record by each one's own length field:
+    /// a length that differs from the layout's is CImportFailure 979203 with the record's index.
+    /// theProgress, when given, receives the percentage done.
+    std::vector<CRecordCodes> scan(const std::function<void(int)>& theProgress = {});
+
+    /// Reads theCount whole records from record theFirst into theBuffer (theCount times the record
+    /// length); CImportFailure 261125 on a read failure.
+    void read(uint64_t theFirst, std::size_t theCount, uint8_t* theBuffer);
+
+    const CNativeRecordLayout& layout() const { return mLayout; }
+
+private:
+    CNativeRecordLayout mLayout;
+    int mFd = -1;
+};
