@@ -43,7 +43,7 @@ struct CFdGuard {
 
 }  // namespace
 
-std::vector<CCeosRecord> fqorvWalkCeosFile(const std::filesystem::path& theFile, std::size_t theMaxRecords)
+std::vector<CCeosRecord> fqorvWalkCeosFile(const std::filesystem::path& theFile, std::size_t theMaxRecords, std::string* theStop)
 {
     const CFdGuard aFd{::open(theFile.c_str(), O_RDONLY | O_CLOEXEC)};
     if (aFd.mFd < 0) fqorvImportFail(CQORV_ERR_MISSING_FILE, theFile.string() + ": " + std::strerror(errno));
@@ -51,29 +51,34 @@ std::vector<CCeosRecord> fqorvWalkCeosFile(const std::filesystem::path& theFile,
     const uint64_t aSize = std::filesystem::file_size(theFile, aError);
     if (aError) fqorvImportFail(CQORV_ERR_RASTER_READ, theFile.string() + ": " + aError.message());
 
-    const auto stop = [&](std::size_t theIndex, uint64_t theOffset, const std::string& theWhy) {
-        fqorvImportFail(CQORV_ERR_IMPORT_RECORD_LENGTH, theFile.filename().string() + ": record " +
-                                                            std::to_string(theIndex + 1) + " at byte " +
-                                                            std::to_string(theOffset) + " " + theWhy);
-    };
     std::vector<CCeosRecord> aRecords;
+    std::string aStop;
     uint64_t aOffset = 0;
     while (aOffset < aSize && aRecords.size() < theMaxRecords) {
-        uint8_t aHeader[CQORV_CEOS_HEADER_BYTES];
+        const std::string aWhere = theFile.filename().string() + ": record " + std::to_string(aRecords.size() + 1) +
+                                   " at byte " + std::to_string(aOffset);
         if (aSize - aOffset < CQORV_CEOS_HEADER_BYTES) {
-            stop(aRecords.size(), aOffset, "is cut off: " + std::to_string(aSize - aOffset) + " bytes remain");
+            aStop = aWhere + " is cut off: " + std::to_string(aSize - aOffset) + " bytes remain";
+            break;
         }
+        uint8_t aHeader[CQORV_CEOS_HEADER_BYTES];
         if (!fqorvReadAt(aFd.mFd, aOffset, aHeader, sizeof aHeader))
             fqorvImportFail(CQORV_ERR_RASTER_READ, theFile.string() + ": " + std::strerror(errno));
         const CCeosRecord aRecord = fqorvCeosRecordHeader(aHeader, aOffset);
-        if (aRecord.mLength < CQORV_CEOS_HEADER_BYTES)
-            stop(aRecords.size(), aOffset, "states a length of " + std::to_string(aRecord.mLength) + " bytes, below its header");
-        if (aRecord.mLength > aSize - aOffset)
-            stop(aRecords.size(), aOffset, "states a length of " + std::to_string(aRecord.mLength) +
-                                               " bytes, beyond the file's end at byte " + std::to_string(aSize));
+        if (aRecord.mLength < CQORV_CEOS_HEADER_BYTES) {
+            aStop = aWhere + " states a length of " + std::to_string(aRecord.mLength) + " bytes, below its header";
+            break;
+        }
+        if (aRecord.mLength > aSize - aOffset) {
+            aStop = aWhere + " states a length of " + std::to_string(aRecord.mLength) + " bytes, beyond the file's end at byte " +
+                    std::to_string(aSize);
+            break;
+        }
         aRecords.push_back(aRecord);
         aOffset += aRecord.mLength;
     }
+    if (!aStop.empty() && theStop == nullptr) fqorvImportFail(CQORV_ERR_IMPORT_RECORD_LENGTH, aStop);
+    if (theStop != nullptr) *theStop = aStop;
     return aRecords;
 }
 

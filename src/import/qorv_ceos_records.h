@@ -48,10 +48,13 @@ CCeosRecord fqorvCeosRecordHeader(const uint8_t* theBytes, uint64_t theOffset);
 
 /// Walks theFile from its start record by record by the records' length fields, up to
 /// theMaxRecords records. A record stating a length below the header's 12 bytes or reaching beyond
-/// the file's end, or bytes after the last record too few for a header, stop the walk: CImportFailure
-/// 979203 naming the file, the record's index and its byte. 261122 when theFile can't be opened.
+/// the file's end, or bytes after the last record too few for a header, stop the walk: with
+/// theStop given, the words naming the file, the record's index and its byte go there and the
+/// records before are returned; without it, they are CImportFailure 979203. 261122 when theFile
+/// can't be opened.
 std::vector<CCeosRecord> fqorvWalkCeosFile(const std::filesystem::path& theFile,
-                                           std::size_t theMaxRecords = static_cast<std::size_t>(-1));
+                                           std::size_t theMaxRecords = static_cast<std::size_t>(-1),
+                                           std::string* theStop = nullptr);
 
 /// The first record of theRecords of kind (theFirst, theSecond), or nullptr.
 const CCeosRecord* fqorvFindCeosRecord(const std::vector<CCeosRecord>& theRecords, uint8_t theFirst, uint8_t theSecond);

@@ -223,16 +223,16 @@ CNativeFileClass fqorvClassifyNativeFile(const fs::path& theFile)
     // A leader: a data set summary among its first records.
     aClass.mKind = ENativeFileKind::CeosOther;
     aClass.mWhat = "a CEOS file that is neither a leader nor a data file (first record of types " + aFirst.typeText() + ")";
-    try {
-        const std::vector<CCeosRecord> aRecords = fqorvWalkCeosFile(theFile, 16);
-        if (const CCeosRecord* aSummary = fqorvFindCeosRecord(aRecords, 10, 10)) {
-            aClass.mKind = ENativeFileKind::CeosLeader;
-            const CCeosFields aFields = fqorvReadCeosRecord(theFile, *aSummary, "data set summary");
-            aClass.mMission = aFields.length() >= 412 ? aFields.text(396, 16) : "";
-            aClass.mWhat = "a CEOS leader of the mission '" + aClass.mMission + "'";
-        }
-    } catch (const CImportFailure& aFailure) {
-        aClass.mWhat = "a CEOS file whose records can't be walked (" + std::string(aFailure.parameter()) + ")";
+    // The walk may stop at a broken record: the records before it tell the kind, reading tells the rest.
+    std::string aStop;
+    const std::vector<CCeosRecord> aRecords = fqorvWalkCeosFile(theFile, 16, &aStop);
+    if (const CCeosRecord* aSummary = fqorvFindCeosRecord(aRecords, 10, 10)) {
+        aClass.mKind = ENativeFileKind::CeosLeader;
+        const CCeosFields aFields = fqorvReadCeosRecord(theFile, *aSummary, "data set summary");
+        aClass.mMission = aFields.length() >= 412 ? aFields.text(396, 16) : "";
+        aClass.mWhat = "a CEOS leader of the mission '" + aClass.mMission + "'";
+    } else if (!aStop.empty()) {
+        aClass.mWhat = "a CEOS file whose records can't be walked (" + aStop + ")";
     }
     return aClass;
 }
