@@ -85,7 +85,8 @@ public:
     {
         CQorvDate aDate;
         const std::string aText = text(theKey);
-        if (!aDate.parse(aText.c_str())) fqorvImportFail(CQORV_ERR_IMPORT_VALUE, mName + ": " + theKey + " '" + aText + "' is not a date");
+        if (!aDate.parse(aText.c_str()))
+            fqorvImportFail(CQORV_ERR_IMPORT_VALUE, mName + ": " + theKey + " '" + aText + "' is not a date");
         return aDate;
     }
 
@@ -167,7 +168,8 @@ CKeyValues findPacketDescriptor(const std::vector<uint8_t>& theHeaders, const CK
                                                     std::to_string(aSphSize));
     for (int64_t i = 0; i < aCount; ++i) {
         const std::size_t aBegin = static_cast<std::size_t>(aFirst + i * aSize);
-        CKeyValues aDsd(theHeaders, aBegin, aBegin + static_cast<std::size_t>(aSize), theFile + " data set descriptor " + std::to_string(i + 1));
+        const CKeyValues aDsd(theHeaders, aBegin, aBegin + static_cast<std::size_t>(aSize),
+                              theFile + " data set descriptor " + std::to_string(i + 1));
         if (aDsd.has("DS_NAME") && aDsd.text("DS_NAME") == "SAR_SOURCE_PACKETS") return aDsd;
     }
     fqorvImportFail(CQORV_ERR_IMPORT_VALUE, theFile + " has no data set SAR_SOURCE_PACKETS");
@@ -184,11 +186,13 @@ void readPacketLayout(const CKeyValues& theDsd, CNativeArchive& theArchive)
         fqorvImportFail(CQORV_ERR_IMPORT_LAYOUT, aName + ": SAR_SOURCE_PACKETS of " + aLengths + ", the ERS layout has " +
                                                      std::to_string(CQORV_ERS_DSR_BYTES));
     if (theDsd.has("DS_SIZE") && theDsd.integer("DS_SIZE") != aCount * aDsrSize)
-        fqorvImportFail(CQORV_ERR_IMPORT_RECORD_LENGTH, aName + ": SAR_SOURCE_PACKETS of " + std::to_string(theDsd.integer("DS_SIZE")) +
-                                                            " bytes hold not " + std::to_string(aCount) + " " + aLengths);
+        fqorvImportFail(CQORV_ERR_IMPORT_RECORD_LENGTH, aName + ": SAR_SOURCE_PACKETS of " +
+                                                            std::to_string(theDsd.integer("DS_SIZE")) + " bytes hold not " +
+                                                            std::to_string(aCount) + " " + aLengths);
     const int64_t aOffset = theDsd.integer("DS_OFFSET");
     if (aOffset < static_cast<int64_t>(CQORV_MPH_BYTES))
-        fqorvImportFail(CQORV_ERR_IMPORT_VALUE, aName + ": SAR_SOURCE_PACKETS at byte " + std::to_string(aOffset) + ", inside the headers");
+        fqorvImportFail(CQORV_ERR_IMPORT_VALUE,
+                        aName + ": SAR_SOURCE_PACKETS at byte " + std::to_string(aOffset) + ", inside the headers");
 
     CNativeRecordLayout& aLayout = theArchive.mLayout;
     aLayout.mDataFile = theArchive.mFiles.front();

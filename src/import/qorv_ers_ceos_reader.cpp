@@ -85,11 +85,8 @@ std::string polarisationOf(const std::string& theSensorText)
 void readDataSetSummary(const CCeosFields& theDss, CNativeArchive& theArchive)
 {
     const std::string aMission = theDss.text(396, 16);
+    fqorvRefuseOtherMission(aMission, CQORV_ERR_IMPORT_LEADER, theDss.name() + " is of the mission '" + aMission + "', not ERS-1/2");
     theArchive.mSensor = fqorvErsMission(aMission);
-    if (theArchive.mSensor.empty()) {
-        if (aMission.rfind("ALOS", 0) == 0) fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT, "ALOS PALSAR level 1.0 is not imported yet");
-        fqorvImportFail(CQORV_ERR_IMPORT_LEADER, theDss.name() + " is of the mission '" + aMission + "', not ERS-1/2");
-    }
 
     // The clock: the binary time's count and its UTC give the reference of every time.
     const int64_t aTicks = requiredInteger(theDss, 982, 16, "satellite binary time");
@@ -206,7 +203,7 @@ void readDataFile(const std::filesystem::path& theData, CNativeArchive& theArchi
         fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT, aName + " holds samples of type '" + aSampleType + "' (" +
                                                             aFdr.text(400, 28) + "), not the raw 'CI*2' of ERS");
     const int64_t aRecordLength = requiredInteger(aFdr, 186, 6, "record length");
-    const int64_t aLines = requiredInteger(aFdr, 236, 8, "number of lines");
+    const int64_t aLines = aFdr.integer(236, 8).value_or(0);   // blank: the whole records are taken
     const int64_t aSamples = requiredInteger(aFdr, 248, 8, "samples per line");
     // The stated prefix leaves out the record's 12-byte header.
     const int64_t aRowPrefix = requiredInteger(aFdr, 276, 4, "prefix length") + CQORV_CEOS_HEADER_BYTES;
@@ -220,7 +217,8 @@ void readDataFile(const std::filesystem::path& theData, CNativeArchive& theArchi
     const CErsCeosVariant* aVariant = nullptr;
     for (const CErsCeosVariant& aCandidate : CQORV_ERS_CEOS_VARIANTS)
         if (aCandidate.mRecordLength == aRecordLength && aCandidate.mRowPrefix == aRowPrefix) aVariant = &aCandidate;
-    const std::string aLengths = "records of " + std::to_string(aRecordLength) + " bytes with a prefix of " + std::to_string(aRowPrefix);
+    const std::string aLengths =
+        "records of " + std::to_string(aRecordLength) + " bytes with a prefix of " + std::to_string(aRowPrefix);
     if (aVariant == nullptr)
         fqorvImportFail(CQORV_ERR_IMPORT_LAYOUT, aName + ": " + aLengths + " match no known facility layout");
 

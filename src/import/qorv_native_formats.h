@@ -21,6 +21,10 @@ bool fqorvReadAt(int theFd, uint64_t theOffset, void* theBuffer, std::size_t the
 /// "ERS-1" or "ERS-2" for a mission text ("ERS2", "ERS-2", "E2", ...), "" for any other.
 std::string fqorvErsMission(const std::string& theMission);
 
+/// Refuses a mission other than ERS-1/2 (for a CEOS mission text): ALOS is named as not imported
+/// yet (979201), any other fails with theId and theWords.
+void fqorvRefuseOtherMission(const std::string& theMission, int theId, const std::string& theWords);
+
 /// Sets the positions of the auxiliary block from the image format counter's: every ERS layout
 /// holds the same 26 bytes in the same order, only the block's place in the record differs.
 void fqorvSetErsAuxPositions(CNativeRecordLayout& theLayout, int theCounterPos);

@@ -72,6 +72,13 @@ std::string fqorvErsMission(const std::string& theMission)
     return "";
 }
 
+void fqorvRefuseOtherMission(const std::string& theMission, int theId, const std::string& theWords)
+{
+    if (!fqorvErsMission(theMission).empty()) return;
+    if (theMission.rfind("ALOS", 0) == 0) fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT, "ALOS PALSAR level 1.0 is not imported yet");
+    fqorvImportFail(theId, theWords);
+}
+
 void fqorvSetErsAuxPositions(CNativeRecordLayout& theLayout, int theCounterPos)
 {
     theLayout.mCounterPos = theCounterPos;
@@ -169,7 +176,8 @@ void fqorvCountRecords(CNativeArchive& theArchive)
 
 void fqorvCheckStatedValues(const CNativeArchive& theArchive)
 {
-    const std::string aSource = theArchive.mFiles.empty() ? theArchive.mSource.string() : theArchive.mFiles.front().filename().string();
+    const std::string aSource =
+        theArchive.mFiles.empty() ? theArchive.mSource.string() : theArchive.mFiles.front().filename().string();
     const auto check = [&](double theValue, double theLow, double theHigh, const char* theWhat, const char* theUnit) {
         if (std::isnan(theValue) || (theValue > theLow && theValue < theHigh)) return;
         char aText[64];
@@ -239,14 +247,12 @@ CNativeFileClass fqorvClassifyNativeFile(const fs::path& theFile)
 
 namespace {
 
-/// Refuses a CEOS leader of another mission than ERS (979201, ALOS named as not imported yet).
+/// Refuses a CEOS leader given (or alone in a directory) of another mission than ERS.
 void refuseOtherMission(const CNativeFileClass& theLeader, const fs::path& theFile)
 {
-    if (!fqorvErsMission(theLeader.mMission).empty()) return;
-    if (theLeader.mMission.rfind("ALOS", 0) == 0)
-        fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT, "ALOS PALSAR level 1.0 is not imported yet");
-    fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT, theFile.string() + " is a CEOS leader of the mission '" + theLeader.mMission +
-                                                        "': only ERS-1/2 CEOS raw products are imported");
+    fqorvRefuseOtherMission(theLeader.mMission, CQORV_ERR_IMPORT_UNKNOWN_INPUT,
+                            theFile.string() + " is a CEOS leader of the mission '" + theLeader.mMission +
+                                "': only ERS-1/2 CEOS raw products are imported");
 }
 
 struct CClassifiedFile {
@@ -296,11 +302,9 @@ fs::path leaderFor(const fs::path& theData, const std::vector<CClassifiedFile>& 
     if (aErs.size() > 1)
         fqorvImportFail(CQORV_ERR_IMPORT_LEADER, "several ERS leaders beside " + theData.string() + ": " + namesOf(aErs));
     for (const CClassifiedFile* aLeader : aLeaders)
-        if (aLeader->mClass.mMission.rfind("ALOS", 0) == 0)
-            fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT, "ALOS PALSAR level 1.0 is not imported yet");
-    if (!aLeaders.empty())
-        fqorvImportFail(CQORV_ERR_IMPORT_LEADER, "no ERS leader beside " + theData.string() + ": " + aLeaders.front()->mPath.filename().string() +
-                                                     " is " + aLeaders.front()->mClass.mWhat);
+        fqorvRefuseOtherMission(aLeader->mClass.mMission, CQORV_ERR_IMPORT_LEADER,
+                                "no ERS leader beside " + theData.string() + ": " + aLeader->mPath.filename().string() +
+                                    " is " + aLeader->mClass.mWhat);
     const std::vector<const CClassifiedFile*> aOthers = ofKind(theCandidates, ENativeFileKind::CeosOther);
     fqorvImportFail(CQORV_ERR_IMPORT_LEADER, "no CEOS leader beside " + theData.string() +
                                                  (aOthers.empty() ? std::string() : " (other CEOS files: " + namesOf(aOthers) + ")"));
@@ -328,7 +332,9 @@ CNativeArchive readDirectory(const fs::path& theDirectory)
         const std::vector<const CClassifiedFile*> aEnvisat = ofKind(aFiles, ENativeFileKind::Envisat);
         fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT,
                         theDirectory.string() + " holds no CEOS data file (" + std::to_string(aFiles.size()) + " files" +
-                            (aEnvisat.empty() ? std::string() : "; ENVISAT-format products are named one by one: " + namesOf(aEnvisat)) + ")");
+                            (aEnvisat.empty() ? std::string()
+                                              : "; ENVISAT-format products are named one by one: " + namesOf(aEnvisat)) +
+                            ")");
     }
     const fs::path aDataFile = dataFileAmong(aFiles, "in " + theDirectory.string());
     return fqorvReadErsCeos(leaderFor(aDataFile, aFiles), aDataFile);
@@ -398,8 +404,9 @@ std::vector<CRecordCodes> CNativeRecordFile::scan(const std::function<void(int)>
     int aPercent = -1;
     for (uint64_t i = 0; i < mLayout.mRecords; ++i) {
         if (!fqorvReadAt(mFd, mLayout.mFirstRecord + i * mLayout.mRecordLength, aPrefix.data(), aSpan))
-            fqorvImportFail(CQORV_ERR_RASTER_READ, mLayout.mDataFile.string() + ": record " + std::to_string(i + 1) + " can't be read" +
-                                                       (errno != 0 ? std::string(": ") + std::strerror(errno) : std::string()));
+            fqorvImportFail(CQORV_ERR_RASTER_READ,
+                            mLayout.mDataFile.string() + ": record " + std::to_string(i + 1) + " can't be read" +
+                                (errno != 0 ? std::string(": ") + std::strerror(errno) : std::string()));
         const uint32_t aStated = statedLength(mLayout, aPrefix.data());
         if (aStated != mLayout.mRecordLength) failRecordLength(mLayout, i, aStated);
         aCodes.push_back(codesOf(mLayout, aPrefix.data()));
