@@ -56,6 +56,7 @@ struct CPlannedProduct {
 };
 
 struct CLinePlan {
+    int64_t mRecords = 0;             // whole records of the data file planned
     std::vector<CPlannedProduct> mProducts;
     std::vector<std::string> mNotes;  // about the whole file (records left out, products too short)
     std::vector<std::string> mWarnings;   // the clock fell back to the scene time (warning 195843)
