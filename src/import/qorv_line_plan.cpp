@@ -46,9 +46,10 @@ int64_t fCounterStep(int64_t theFrom, uint32_t theTo)
     return aStep >= CQORV_COUNTER_SPAN / 2 ? aStep - CQORV_COUNTER_SPAN : aStep;
 }
 
-/// A step by which one counter fits the next: the next line or a gap the chain fills itself.
-/// Narrower than the steps a product holds (up to CQORV_PLAN_MAX_FILL + 1), so that a garbled counter a few hundred lines ahead is not taken
-/// for a gap (whose fill would push the good records after it out as repeats).
+/// A step by which one counter fits the next: the next line or a gap the chain fills itself. It
+/// is narrower than the steps a product holds (up to CQORV_PLAN_MAX_FILL + 1), so that a counter
+/// garbled a few hundred lines ahead is not taken for a gap, whose fill lines would turn the good
+/// records after it into repeats.
 bool fFits(int64_t theStep) { return theStep >= 1 && theStep <= CQORV_CHAIN_GAP_LIMIT + 1; }
 
 std::string fCount(int64_t theCount, const char* theOne, const char* theMany)
@@ -76,7 +77,8 @@ public:
     {
         std::string aText;
         for (const std::string& w : mListed) aText += (aText.empty() ? "" : ", ") + w;
-        if (mCount > static_cast<int64_t>(mListed.size())) aText += " and " + std::to_string(mCount - static_cast<int64_t>(mListed.size())) + " more";
+        const int64_t aMore = mCount - static_cast<int64_t>(mListed.size());
+        if (aMore > 0) aText += " and " + std::to_string(aMore) + " more";
         return aText;
     }
     /// "record 5", "records 5, 9, 12": for a tally of record indices.
@@ -109,7 +111,10 @@ int fMostFrequent(const CCodes& theCodes, int64_t theFirst, int64_t theLast, TCo
     for (std::size_t i = 0; i < aCodes.size();) {
         std::size_t j = i;
         while (j < aCodes.size() && aCodes[j] == aCodes[i]) ++j;
-        if (j - i > aBestRun) aBest = aCodes[i], aBestRun = j - i;
+        if (j - i > aBestRun) {
+            aBest = aCodes[i];
+            aBestRun = j - i;
+        }
         i = j;
     }
     return aBest;
@@ -223,13 +228,15 @@ std::vector<CDraft> fWalkRecords(const CCodes& theCodes, const std::vector<int64
     std::size_t aStretch = 0;
     CTally aLeftOut, aJumps, aPriChanges;
 
-    auto aLeads = [&](int64_t i) { return theCodes[i].mMarker && i + 1 < n && fFits(theCounter[i + 1] - theCounter[i]); };
-    auto aLine = [&](CDraft& d, int64_t theSource, int64_t theCounter) {
+    auto aLeads = [&](int64_t i) {
+        return theCodes[i].mMarker && i + 1 < n && fFits(theCounter[i + 1] - theCounter[i]);
+    };
+    auto aLine = [&](CDraft& d, int64_t theSource, int64_t theUnwrapped) {
         if (theSource >= 0 && theCodes[theSource].mMarker && theCodes[theSource].mPri != d.mProduct.mPriCode)
             d.mPriGarbage.addRecord(theSource);
         CPlannedLine l;
         l.mSource = theSource;
-        l.mCounter = static_cast<uint32_t>(std::max<int64_t>(1, theCounter - d.mFirstCounter + 1));
+        l.mCounter = static_cast<uint32_t>(std::max<int64_t>(1, theUnwrapped - d.mFirstCounter + 1));
         l.mPri = static_cast<uint16_t>(d.mProduct.mPriCode);
         d.mProduct.mLines.push_back(l);
     };
@@ -274,7 +281,8 @@ std::vector<CDraft> fWalkRecords(const CCodes& theCodes, const std::vector<int64
             continue;
         }
         if (aStep > CQORV_CHAIN_GAP_LIMIT + 1) {
-            d.mFills.add([&] { return fqorvStringFormat("%lld before record %lld", fLL(aStep - 1), fLL(i)); }, aStep - 1);
+            d.mFills.add([&] { return fqorvStringFormat("%lld before record %lld", fLL(aStep - 1), fLL(i)); },
+                         aStep - 1);
             for (int64_t k = 1; k < aStep; ++k) aLine(d, -1, d.mTopCounter + k);
         }
         if (aStep <= 0) d.mRepeats.addRecord(i);
@@ -297,7 +305,8 @@ std::vector<CDraft> fWalkRecords(const CCodes& theCodes, const std::vector<int64
         theNotes.push_back("the line counter jumps further than " + std::to_string(CQORV_PLAN_MAX_FILL) +
                            " lines, where a new product starts: " + aJumps.list());
     if (!aPriChanges.empty())
-        theNotes.push_back("the PRI code changes, where a new product starts (one PRF per product): " + aPriChanges.list());
+        theNotes.push_back("the PRI code changes, where a new product starts (one PRF per product): " +
+                           aPriChanges.list());
     return aDrafts;
 }
 
@@ -336,7 +345,9 @@ void fPlanWindow(CDraft& theDraft, const CCodes& theCodes, const std::vector<int
     auto aSwst = [](const CRecordCodes& c) { return static_cast<int>(c.mSwst); };
     // A run counts within the product only.
     const int64_t aMarkedAtEnd = theMarkedBefore[p.mLastRecord + 1];
-    auto aHolds = [&](int64_t i) { return std::min<int64_t>(theRun[i], aMarkedAtEnd - theMarkedBefore[i]) >= CQORV_PLAN_PERSISTENCE; };
+    auto aHolds = [&](int64_t i) {
+        return std::min<int64_t>(theRun[i], aMarkedAtEnd - theMarkedBefore[i]) >= CQORV_PLAN_PERSISTENCE;
+    };
     auto aTrusted = [&](const CPlannedLine& l) { return l.mSource >= 0 && theCodes[l.mSource].mMarker; };
 
     int aInForce = -1;
@@ -452,9 +463,12 @@ void fCheckClockOrder(const std::vector<CClockFit>& theFits, const CCodes& theCo
     }
     if (aOff * CQORV_CLOCK_OFF_RATIO <= aReadings) return;
     int64_t aBefore = -1, aFalls = -1;
-    for (int64_t i = 0; i < static_cast<int64_t>(theCodes.size()) && aFalls < 0; ++i) {
+    for (int64_t i = 0; i < static_cast<int64_t>(theCodes.size()); ++i) {
         if (!theCodes[i].mMarker) continue;
-        if (aBefore >= 0 && static_cast<int32_t>(theCodes[i].mClock - theCodes[aBefore].mClock) < 0) aFalls = i;
+        if (aBefore >= 0 && static_cast<int32_t>(theCodes[i].mClock - theCodes[aBefore].mClock) < 0) {
+            aFalls = i;
+            break;
+        }
         aBefore = i;
     }
     const std::string aWhere =
@@ -469,8 +483,8 @@ void fCheckClockOrder(const std::vector<CClockFit>& theFits, const CCodes& theCo
 /// more than CQORV_CLOCK_SCENE_TOLERANCE off it (or there is no clock): then the scene time's, with
 /// a warning. The scene time places the file's pulses: a centre time their middle, a sensing start
 /// the first record's pulse, the records the products leave out at their ends counted as pulses.
-void fTimeProducts(std::vector<CDraft>& theDrafts, const std::vector<CClockFit>& theFits, const CNativeArchive& theArchive,
-                   int64_t theRecords, CLinePlan& thePlan)
+void fTimeProducts(std::vector<CDraft>& theDrafts, const std::vector<CClockFit>& theFits,
+                   const CNativeArchive& theArchive, int64_t theRecords, CLinePlan& thePlan)
 {
     const bool aCentre = std::isfinite(theArchive.mCentreTime);
     const bool aStart = !aCentre && std::isfinite(theArchive.mSensingStart);
@@ -480,36 +494,35 @@ void fTimeProducts(std::vector<CDraft>& theDrafts, const std::vector<CClockFit>&
     const int64_t aFilePulse0 = aFirst.mFirstCounter - aFirst.mProduct.mFirstRecord;
     const int64_t aFilePulseN = aLast.mTopCounter + (theRecords - 1 - aLast.mProduct.mLastRecord);
 
+    const double aFileMiddle = 0.5 * static_cast<double>(aFilePulse0 + aFilePulseN);
+
     for (std::size_t k = 0; k < theDrafts.size(); ++k) {
         CPlannedProduct& p = theDrafts[k].mProduct;
         const CClockFit& f = theFits[k];
         const double aPulse = static_cast<double>(theDrafts[k].mFirstCounter);
-        const double aScene = aCentre  ? theArchive.mCentreTime + (aPulse - 0.5 * static_cast<double>(aFilePulse0 + aFilePulseN)) / p.mPrf
+        const double aScene = aCentre  ? theArchive.mCentreTime + (aPulse - aFileMiddle) / p.mPrf
                               : aStart ? theArchive.mSensingStart + (aPulse - static_cast<double>(aFilePulse0)) / p.mPrf
                                        : NAN;
         const std::string aRecords = fqorvStringFormat("records %lld to %lld", fLL(p.mFirstRecord), fLL(p.mLastRecord));
+        if (!f.mOff.empty())
+            p.mNotes.push_back(fCount(f.mOff.count(), "clock reading", "clock readings") + " of " +
+                               std::to_string(f.mReadings) + " off the others by more than a tick and four pulses (" +
+                               f.mOff.records() + "): ignored");
+        p.mFirstPulseTime = f.mFirstPulse;
+        p.mTimeSource = "on-board clock";
         if (!std::isfinite(f.mFirstPulse)) {
             if (!std::isfinite(aScene))
                 fqorvImportFail(CQORV_ERR_IMPORT_VALUE, aRecords + ": no on-board clock reading and no scene time");
-            p.mFirstPulseTime = aScene;
-            p.mTimeSource = aSceneName;
             p.mNotes.push_back(std::string("no on-board clock reading: the first pulse is timed from the ") + aSceneName);
+        } else if (std::isfinite(aScene) && std::abs(f.mFirstPulse - aScene) > CQORV_CLOCK_SCENE_TOLERANCE) {
+            thePlan.mWarnings.push_back(aRecords + fqorvStringFormat(": the on-board clock lies %.3f s off the %s, "
+                                                                     "which times the first pulse instead",
+                                                                     f.mFirstPulse - aScene, aSceneName));
+        } else {
             continue;
         }
-        p.mFirstPulseTime = f.mFirstPulse;
-        p.mTimeSource = "on-board clock";
-        p.mNotes.push_back(fqorvStringFormat("the first pulse is timed from the on-board clock of %lld records",
-                                             fLL(f.mReadings)) +
-                           (f.mOff.empty() ? std::string()
-                                           : "; " + fCount(f.mOff.count(), "reading", "readings") +
-                                                 " off the others by more than a tick and four pulses ignored (" +
-                                                 f.mOff.records() + ")"));
-        if (std::isfinite(aScene) && std::abs(f.mFirstPulse - aScene) > CQORV_CLOCK_SCENE_TOLERANCE) {
-            thePlan.mWarnings.push_back(aRecords + fqorvStringFormat(": the on-board clock lies %.3f s off the %s, which is used",
-                                                                     f.mFirstPulse - aScene, aSceneName));
-            p.mFirstPulseTime = aScene;
-            p.mTimeSource = aSceneName;
-        }
+        p.mFirstPulseTime = aScene;
+        p.mTimeSource = aSceneName;
     }
 }
 
@@ -518,6 +531,7 @@ void fTimeProducts(std::vector<CDraft>& theDrafts, const std::vector<CClockFit>&
 CLinePlan fqorvPlanLines(const std::vector<CRecordCodes>& theCodes, const CNativeArchive& theArchive)
 {
     const int64_t n = static_cast<int64_t>(theCodes.size());
+    if (n == 0) fqorvImportFail(CQORV_ERR_IMPORT_NO_LINES, "the data file holds no whole record");
     if (std::none_of(theCodes.begin(), theCodes.end(), [](const CRecordCodes& c) { return c.mMarker; }))
         fqorvImportFail(CQORV_ERR_IMPORT_NO_LINES,
                         fqorvStringFormat("none of the %lld records of the data file carries its 0xAA marker", fLL(n)));
@@ -531,7 +545,8 @@ CLinePlan fqorvPlanLines(const std::vector<CRecordCodes>& theCodes, const CNativ
 
     std::vector<int64_t> aMarkedBefore(theCodes.size() + 1, 0);
     for (int64_t i = 0; i < n; ++i) aMarkedBefore[i + 1] = aMarkedBefore[i] + (theCodes[i].mMarker ? 1 : 0);
-    const std::vector<int32_t> aSwstRun = fRunLengths(theCodes, [](const CRecordCodes& c) { return static_cast<int>(c.mSwst); });
+    const std::vector<int32_t> aSwstRun =
+        fRunLengths(theCodes, [](const CRecordCodes& c) { return static_cast<int>(c.mSwst); });
     for (CDraft& d : aDrafts) fPlanWindow(d, theCodes, aSwstRun, aMarkedBefore);
 
     std::vector<CClockFit> aFits;
@@ -591,7 +606,8 @@ CLinePlan fqorvCutPlan(const CLinePlan& thePlan, int64_t theFirst, int64_t theCo
         }
         if (a == p.mLines.size() || b < a) continue;
         CPlannedProduct q = p;
-        q.mLines.assign(p.mLines.begin() + static_cast<std::ptrdiff_t>(a), p.mLines.begin() + static_cast<std::ptrdiff_t>(b) + 1);
+        q.mLines.assign(p.mLines.begin() + static_cast<std::ptrdiff_t>(a),
+                        p.mLines.begin() + static_cast<std::ptrdiff_t>(b + 1));
         const uint32_t aBase = q.mLines.front().mCounter;
         uint32_t aLast = 1;
         for (CPlannedLine& l : q.mLines) {
@@ -606,9 +622,10 @@ CLinePlan fqorvCutPlan(const CLinePlan& thePlan, int64_t theFirst, int64_t theCo
         aCut.mProducts.push_back(std::move(q));
     }
     if (aCut.mProducts.empty())
-        fqorvImportFail(CQORV_ERR_IMPORT_OPTION, fqorvStringFormat("--lines %lld:%lld: records %lld to %lld hold no line of any product",
-                                                                   fLL(theFirst), fLL(theCount), fLL(theFirst), fLL(aEnd - 1)));
-    aCut.mNotes.push_back(fqorvStringFormat("--lines %lld:%lld: the products are cut to records %lld to %lld", fLL(theFirst),
-                                            fLL(theCount), fLL(theFirst), fLL(aEnd - 1)));
+        fqorvImportFail(CQORV_ERR_IMPORT_OPTION,
+                        fqorvStringFormat("--lines %lld:%lld: records %lld to %lld hold no line of any product",
+                                          fLL(theFirst), fLL(theCount), fLL(theFirst), fLL(aEnd - 1)));
+    aCut.mNotes.push_back(fqorvStringFormat("--lines %lld:%lld: the products are cut to records %lld to %lld",
+                                            fLL(theFirst), fLL(theCount), fLL(theFirst), fLL(aEnd - 1)));
     return aCut;
 }

@@ -1,7 +1,8 @@
-// The line plan of an import: record codes in, products out, each checked against what the chain's
-// line continuity makes of its prefixes.
+// The line plan of an import: record codes in, products out, each product read back the way the
+// chain's line continuity reads its prefixes.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <chrono>
 #include <cmath>
 #include <cstdint>
@@ -15,47 +16,47 @@
 
 namespace {
 
+using CEdit = std::function<void(std::vector<CRecordCodes>&)>;
+
 constexpr int kPri = 2820;
 constexpr int kSwst = 878;
 const double kPrf = 1.0 / ((kPri + 2) * 210.94e-9);
 constexpr double kT0 = 51234.5678901;   // s of day of pulse 0
 
-/// One record per pulse index: counter from theBase, the clock latched every fourth pulse in
-/// 1/256 s ticks (tick 0 at 0 s), PRI 2820, SWST 878, marker in place.
+/// One record per pulse index: counter from theBase (a stray high byte above its 24 bits), the
+/// clock latched every fourth pulse in 1/256 s ticks (tick 0 at 0 s), PRI 2820, SWST 878.
 std::vector<CRecordCodes> fRecords(const std::vector<int64_t>& thePulses, uint32_t theBase = 1000)
 {
     std::vector<CRecordCodes> aCodes;
     for (int64_t k : thePulses) {
-        CRecordCodes c;
-        c.mCounter = static_cast<uint32_t>((theBase + k) & 0xFFFFFF) | 0xAB000000u;   // high byte: not counter
-        c.mClock = static_cast<uint32_t>(std::floor((kT0 + static_cast<double>(k / 4 * 4) / kPrf) * 256.0));
-        c.mSwst = kSwst;
-        c.mPri = kPri;
-        c.mMarker = true;
-        aCodes.push_back(c);
+        const double aLatch = kT0 + static_cast<double>(k / 4 * 4) / kPrf;
+        aCodes.push_back({static_cast<uint32_t>((theBase + k) & 0xFFFFFF) | 0xAB000000u,
+                          static_cast<uint32_t>(std::floor(aLatch * 256.0)), kSwst, kPri, true});
     }
     return aCodes;
 }
 
-/// Pulses [theFirst, theEnd) after thePulses.
+/// thePulses followed by [theFirst, theEnd).
 std::vector<int64_t> fPulses(int64_t theFirst, int64_t theEnd, std::vector<int64_t> thePulses = {})
 {
     for (int64_t k = theFirst; k < theEnd; ++k) thePulses.push_back(k);
     return thePulses;
 }
 
-CNativeArchive fArchive()
+CNativeArchive fArchive(double theCentre = NAN, double theStart = NAN)
 {
     CNativeArchive a;
-    a.mClock.mReferenceTime = 0.0;
+    a.mClock.mReferenceTime = 0.0;   // tick 0 at 0 s
+    a.mCentreTime = theCentre;
+    a.mSensingStart = theStart;
     return a;
 }
 
-/// The chain's view of a product's prefixes, written independently of the plan: a counter that
-/// does not grow is dropped, steps of up to 31 are followed; false on a first counter other than 1,
-/// a step beyond 31, a SWST off the 22-code steps from the first line, or a PRI other than the
-/// product's. theLines: the lines the chain forms.
-bool fChainFollows(const CPlannedProduct& p, int64_t& theLines)
+/// Reads a product as the chain does, written apart from the plan: a counter that does not grow
+/// is dropped, steps up to 31 are followed. False on a first counter other than 1, a longer step,
+/// a SWST off the 22-code steps from the first line's, a PRI other than the product's, or lines
+/// formed other than the pulses the product states.
+bool fChainFollows(const CPlannedProduct& p)
 {
     int64_t aLast = 0;
     for (const CPlannedLine& l : p.mLines) {
@@ -64,38 +65,32 @@ bool fChainFollows(const CPlannedProduct& p, int64_t& theLines)
         if ((l.mSwst - p.mFirstSwst) % 22 != 0 || l.mPri != p.mPriCode) return false;
         if (aStep >= 1) aLast = l.mCounter;
     }
-    theLines = aLast;
     return p.mLines.front().mSwst == p.mFirstSwst && aLast == p.mPulses;
 }
 
-/// Plans theCodes and checks every product against the chain's view.
 CLinePlan fPlan(const std::vector<CRecordCodes>& theCodes, const CNativeArchive& theArchive = fArchive())
 {
     const CLinePlan aPlan = fqorvPlanLines(theCodes, theArchive);
-    for (const CPlannedProduct& p : aPlan.mProducts) {
-        int64_t aLines = 0;
-        EXPECT_TRUE(fChainFollows(p, aLines)) << "records " << p.mFirstRecord << " to " << p.mLastRecord;
-    }
+    for (const CPlannedProduct& p : aPlan.mProducts) EXPECT_TRUE(fChainFollows(p)) << "from record " << p.mFirstRecord;
     return aPlan;
 }
 
-std::string fAllNotes(const CLinePlan& thePlan)
+/// True when a note of the plan or its products holds theWords.
+bool fNoted(const CLinePlan& thePlan, const std::string& theWords)
 {
-    std::string aText;
-    for (const std::string& n : thePlan.mNotes) aText += n + "\n";
+    std::string aAll;
+    for (const std::string& n : thePlan.mNotes) aAll += n + "\n";
     for (const CPlannedProduct& p : thePlan.mProducts)
-        for (const std::string& n : p.mNotes) aText += n + "\n";
-    return aText;
+        for (const std::string& n : p.mNotes) aAll += n + "\n";
+    return aAll.find(theWords) != std::string::npos || (ADD_FAILURE() << aAll, false);
 }
 
 int64_t fFillLines(const CPlannedProduct& p)
 {
-    int64_t aFills = 0;
-    for (const CPlannedLine& l : p.mLines) aFills += l.mSource < 0;
-    return aFills;
+    return std::count_if(p.mLines.begin(), p.mLines.end(), [](const CPlannedLine& l) { return l.mSource < 0; });
 }
 
-/// The parameter of the CImportFailure theRun throws, after checking its id.
+/// The words of the CImportFailure theRun throws, after checking its id.
 std::string fFailure(int theId, const std::function<void()>& theRun)
 {
     try {
@@ -110,7 +105,6 @@ std::string fFailure(int theId, const std::function<void()>& theRun)
 
 TEST(LinePlan, CountersGapsAndRepeatsLeaveTheChainOnlyWhatItHandles)
 {
-    using CEdit = std::function<void(std::vector<CRecordCodes>&)>;
     struct CCase {
         const char* mName;
         std::vector<int64_t> mPulses;
@@ -118,13 +112,12 @@ TEST(LinePlan, CountersGapsAndRepeatsLeaveTheChainOnlyWhatItHandles)
         size_t mProducts;
         int64_t mRecordLines, mFills, mSpanned;   // of the first product
         const char* mNote;
-        uint32_t mBase = 1000;
+        uint32_t mBase = 1000;                    // of the counters
     };
     const std::vector<int64_t> aClean = fPulses(0, 600);
     const CCase aCases[] = {
         {"a gap of 30 left to the chain", fPulses(330, 630, fPulses(0, 300)), {}, 1, 600, 0, 630, ""},
         {"a gap of 31 filled", fPulses(331, 631, fPulses(0, 300)), {}, 1, 600, 31, 631, "31 lines filled for 1 gap"},
-        {"a gap of 4096 filled", fPulses(4396, 4696, fPulses(0, 300)), {}, 1, 600, 4096, 4696, "4096 lines filled"},
         {"a gap of 4097 splits", fPulses(4397, 4697, fPulses(0, 300)), {}, 2, 300, 0, 300, "jumps further"},
         {"a jump far back splits", fPulses(-9000, -8700, fPulses(0, 300)), {}, 2, 300, 0, 300, "jumps further"},
         {"a wrap", aClean, {}, 1, 600, 0, 600, "wraps at record 256;", 0xFFFF00},
@@ -145,10 +138,10 @@ TEST(LinePlan, CountersGapsAndRepeatsLeaveTheChainOnlyWhatItHandles)
         const CLinePlan aPlan = fPlan(aCodes);
         ASSERT_EQ(aPlan.mProducts.size(), c.mProducts);
         const CPlannedProduct& p = aPlan.mProducts.front();
-        EXPECT_EQ(static_cast<int64_t>(p.mLines.size()) - fFillLines(p), c.mRecordLines);
         EXPECT_EQ(fFillLines(p), c.mFills);
+        EXPECT_EQ(static_cast<int64_t>(p.mLines.size()), c.mRecordLines + c.mFills);
         EXPECT_EQ(p.mPulses, c.mSpanned);
-        EXPECT_NE(fAllNotes(aPlan).find(c.mNote), std::string::npos) << fAllNotes(aPlan);
+        EXPECT_TRUE(fNoted(aPlan, c.mNote));
         // Each record's line counts its pulses from the product's first; untrusted codes never reach a line.
         for (const CPlannedLine& l : p.mLines) {
             if (l.mSource < 0) continue;
@@ -157,32 +150,37 @@ TEST(LinePlan, CountersGapsAndRepeatsLeaveTheChainOnlyWhatItHandles)
             EXPECT_EQ(l.mPri, kPri);
         }
     }
+    fFailure(CQORV_ERR_IMPORT_NO_LINES, [] { fqorvPlanLines(fRecords(fPulses(0, 31)), fArchive()); });
 }
 
 TEST(LinePlan, PriAndSwstCodesHoldOrGiveWay)
 {
-    struct CCase {
-        const char* mName;
-        std::function<void(std::vector<CRecordCodes>&)> mEdit;
-        size_t mProducts;
-        int mLastPri, mLastSwst;   // written into the last line of the last product
-        const char* mNote;
-    };
-    auto aSet = [](int theFrom, int theTo, uint16_t CRecordCodes::*theCode, int theValue) {
+    auto aSet = [](int theFrom, int theTo, uint16_t CRecordCodes::*theCode, int theValue) -> CEdit {
         return [=](std::vector<CRecordCodes>& c) {
             for (int i = theFrom; i < theTo; ++i) c[i].*theCode = static_cast<uint16_t>(theValue);
         };
     };
-    const CCase aCases[] = {
-        {"a PRI change splits", aSet(300, 600, &CRecordCodes::mPri, 2822), 2, 2822, kSwst, "2820 (1679.902 Hz) to 2822"},
-        {"a PRI code held for 7 records", aSet(300, 307, &CRecordCodes::mPri, 2822), 1, kPri, kSwst, "7 records have a PRI code other"},
-        {"a PRI code out of band", aSet(300, 600, &CRecordCodes::mPri, 100), 1, kPri, kSwst, "300 records have a PRI code"},
-        {"a window step of 22 kept", aSet(300, 600, &CRecordCodes::mSwst, kSwst + 22), 1, kPri, kSwst + 22,
+    const auto aPri = &CRecordCodes::mPri;
+    const auto aSwst = &CRecordCodes::mSwst;
+    struct CCase {
+        const char* mName;
+        CEdit mEdit;
+        size_t mProducts;
+        int mLastPri, mLastSwst;   // of the last line of the last product
+        const char* mNote;
+    } aCases[] = {
+        {"a PRI change splits", aSet(300, 600, aPri, 2822), 2, 2822, kSwst, "2820 (1679.902 Hz) to 2822"},
+        {"a PRI code held for 7 records", aSet(300, 307, aPri, 2822), 1, kPri, kSwst, "7 records have a PRI code"},
+        {"a PRI code out of band", aSet(300, 600, aPri, 100), 1, kPri, kSwst, "300 records have a PRI code"},
+        {"a window step of 22 kept", aSet(300, 600, aSwst, kSwst + 22), 1, kPri, kSwst + 22,
          "moves by +22 codes (+88 samples) at record 300"},
-        {"a window step of 23 replaced", aSet(300, 600, &CRecordCodes::mSwst, kSwst + 23), 1, kPri, kSwst, "300 records have a window code"},
-        {"a window step held for 7 records", aSet(300, 307, &CRecordCodes::mSwst, kSwst + 22), 1, kPri, kSwst, "7 records have a window"},
-        {"a window code below 500", aSet(300, 600, &CRecordCodes::mSwst, kSwst - 19 * 22), 1, kPri, kSwst, "300 records have a window"},
-        {"leading window codes", aSet(0, 5, &CRecordCodes::mSwst, 0), 1, kPri, kSwst, "records 0 to 4 come before"},
+        {"a window step of 23", aSet(300, 600, aSwst, kSwst + 23), 1, kPri, kSwst, "300 records have a window code"},
+        {"a window step held for 7 records", aSet(300, 307, aSwst, kSwst + 22), 1, kPri, kSwst, "7 records have a"},
+        {"a window code below 500", aSet(300, 600, aSwst, kSwst - 19 * 22), 1, kPri, kSwst, "300 records have a"},
+        {"leading window codes", aSet(0, 5, aSwst, 0), 1, kPri, kSwst, "records 0 to 4 come before"},
+        {"a window step 5 records before a product ends",
+         [&](auto& c) { aSet(300, 600, aPri, 2822)(c); aSet(295, 600, aSwst, kSwst + 22)(c); }, 2, 2822, kSwst + 22,
+         "5 records have a window"},
     };
     for (const CCase& c : aCases) {
         SCOPED_TRACE(c.mName);
@@ -192,69 +190,72 @@ TEST(LinePlan, PriAndSwstCodesHoldOrGiveWay)
         ASSERT_EQ(aPlan.mProducts.size(), c.mProducts);
         EXPECT_EQ(aPlan.mProducts.back().mLines.back().mPri, c.mLastPri);
         EXPECT_EQ(aPlan.mProducts.back().mLines.back().mSwst, c.mLastSwst);
-        EXPECT_EQ(aPlan.mProducts.back().mLines.front().mCounter, 1u);
-        EXPECT_NE(fAllNotes(aPlan).find(c.mNote), std::string::npos) << fAllNotes(aPlan);
+        EXPECT_TRUE(fNoted(aPlan, c.mNote));
     }
-    std::vector<CRecordCodes> aCodes = fRecords(fPulses(0, 600));
-    for (CRecordCodes& c : aCodes) c.mPri = 100;
-    EXPECT_NE(fFailure(CQORV_ERR_IMPORT_CODE_RANGE, [&] { fPlan(aCodes); }).find("PRI code 100"), std::string::npos);
-    aCodes = fRecords(fPulses(0, 600));
-    for (CRecordCodes& c : aCodes) c.mSwst = 1501;
-    EXPECT_NE(fFailure(CQORV_ERR_IMPORT_CODE_RANGE, [&] { fPlan(aCodes); }).find("SWST code 1501"), std::string::npos);
+    for (auto [aCode, aValue, aWords] : {std::tuple{aPri, 100, "PRI code 100"}, {aSwst, 1501, "SWST code 1501"}}) {
+        std::vector<CRecordCodes> aCodes = fRecords(fPulses(0, 600));
+        aSet(0, 600, aCode, aValue)(aCodes);
+        EXPECT_NE(fFailure(CQORV_ERR_IMPORT_CODE_RANGE, [&] { fPlan(aCodes); }).find(aWords), std::string::npos);
+    }
 }
 
-TEST(LinePlan, TheClockTimesTheFirstPulseWithinMicroseconds)
+TEST(LinePlan, AFullFrameIsPlannedInMillisecondsAndTimedWithinMicroseconds)
 {
-    // A gap and a split: each product is timed from its own first pulse.
-    std::vector<CRecordCodes> aCodes = fRecords(fPulses(9000, 13000, fPulses(40, 4000)));
-    for (int i : {17, 900, 2222, 3001, 5000}) aCodes[i].mClock += (i % 2 ? 3000 : -3000);
+    // 28,000 records: lost lines, gaps of 40, repeats, garbled codes, corrupt clock readings and a
+    // jump of 5000 lines that starts a second product at pulse 19000. Each product is timed from
+    // its own first pulse, within 5 us from thousands of latches of a 3906 us tick.
+    std::vector<int64_t> aPulses;
+    for (int64_t k = 40; aPulses.size() < 28000; ++k) {
+        if (k % 997 == 996) continue;
+        aPulses.push_back(k < 14000 ? k + k / 3001 * 40 : k + 5000);
+        if (k % 5003 == 5002) aPulses.push_back(aPulses.back());
+    }
+    std::vector<CRecordCodes> aCodes = fRecords(aPulses);
+    for (size_t i = 123; i < aCodes.size(); i += 1009) aCodes[i].mSwst = aCodes[i].mPri = 4000;
+    for (int i : {17, 900, 2222, 3001, 20000}) aCodes[i].mClock += (i % 2 ? 3000 : -3000);
+    const auto aStart = std::chrono::steady_clock::now();
     const CLinePlan aPlan = fPlan(aCodes);
+    const double aMs = std::chrono::duration<double, std::milli>(std::chrono::steady_clock::now() - aStart).count();
+    std::printf("28000 records planned and read back in %.2f ms\n", aMs);
+    EXPECT_LT(aMs, 250.0);   // loose: a pass quadratic in the records would take seconds
     ASSERT_EQ(aPlan.mProducts.size(), 2u);
-    // Within 10 us of the truth from about a thousand latches of a 3906 us tick.
-    EXPECT_NEAR(aPlan.mProducts[0].mFirstPulseTime, kT0 + 40 / kPrf, 1e-5);
-    EXPECT_NEAR(aPlan.mProducts[1].mFirstPulseTime, kT0 + 9000 / kPrf, 1e-5);
+    EXPECT_NEAR(aPlan.mProducts[0].mFirstPulseTime, kT0 + 40 / kPrf, 5e-6);
+    EXPECT_NEAR(aPlan.mProducts[1].mFirstPulseTime, kT0 + 19000 / kPrf, 5e-6);
     EXPECT_EQ(aPlan.mProducts[0].mTimeSource, "on-board clock");
-    EXPECT_NE(fAllNotes(aPlan).find("4 readings off the others by more than a tick and four pulses ignored (records 17, 900, 2222, 3001)"),
-              std::string::npos) << fAllNotes(aPlan);
+    EXPECT_TRUE(fNoted(aPlan, "4 clock readings of 13"));
 
-    // A scene time more than a second off the clock takes over, with a warning; one within keeps it.
-    CNativeArchive aArchive = fArchive();
+    // A scene time more than a second off the clock takes over, with a warning; one within does not.
     std::vector<CRecordCodes> aOne = fRecords(fPulses(0, 3000));
-    aArchive.mCentreTime = kT0 + 1499.5 / kPrf + 1.5;
-    CLinePlan aScene = fPlan(aOne, aArchive);
+    CLinePlan aScene = fPlan(aOne, fArchive(kT0 + 1499.5 / kPrf + 1.5));
     EXPECT_NEAR(aScene.mProducts[0].mFirstPulseTime, kT0 + 1.5, 1e-9);
     EXPECT_EQ(aScene.mProducts[0].mTimeSource, "scene centre time");
-    ASSERT_EQ(aScene.mWarnings.size(), 1u);
-    aArchive.mCentreTime = NAN;
-    aArchive.mSensingStart = kT0 + 0.5;
-    aScene = fPlan(aOne, aArchive);
+    EXPECT_EQ(aScene.mWarnings.size(), 1u);
+    aScene = fPlan(aOne, fArchive(NAN, kT0 + 0.5));
     EXPECT_TRUE(aScene.mWarnings.empty());
-    EXPECT_NEAR(aScene.mProducts[0].mFirstPulseTime, kT0, 1e-5);
+    EXPECT_NEAR(aScene.mProducts[0].mFirstPulseTime, kT0, 5e-6);
 
     // A clock that falls back by 10 s at record 2000.
     for (size_t i = 2000; i < aOne.size(); ++i) aOne[i].mClock -= 2560;
-    EXPECT_NE(fFailure(CQORV_ERR_IMPORT_TIME_ORDER, [&] { fPlan(aOne); }).find("record 2000:"), std::string::npos);
+    const std::string aFalls = "record 2000: the on-board clock falls from " + std::to_string(aOne[1999].mClock);
+    EXPECT_NE(fFailure(CQORV_ERR_IMPORT_TIME_ORDER, [&] { fPlan(aOne); }).find(aFalls), std::string::npos);
 }
 
 TEST(LinePlan, CutRenumbersFromTheFirstLineTheChainKeeps)
 {
-    // 0..299, a filled gap of 40, a repeat of 290..299, then on to 640.
-    const std::vector<CRecordCodes> aCodes = fRecords(fPulses(350, 641, fPulses(290, 300, fPulses(340, 350, fPulses(0, 300)))));
-    const CLinePlan aPlan = fPlan(aCodes);
+    // Records 0..299: pulses 0..299; 300..309: 340..349 after 40 fill lines; 310..319: a repeat of
+    // 290..299; 320..610: 350..640.
+    const CLinePlan aPlan = fPlan(fRecords(fPulses(350, 641, fPulses(290, 300, fPulses(340, 350, fPulses(0, 300))))));
     ASSERT_EQ(aPlan.mProducts.size(), 1u);
     struct CCase {
-        int64_t mFirst, mCount;
-        int64_t mFirstRecord, mLastRecord, mPulses, mFirstPulse;
+        int64_t mFirst, mCount, mFirstRecord, mLastRecord, mPulses, mFirstPulse;
     };
-    // Records 300..309 hold pulses 340..349 after the fill; 310..319 are the repeat.
     for (const CCase& c : {CCase{250, 100, 250, 349, 130, 250}, CCase{300, 10, 300, 309, 10, 340},
                            CCase{312, 20, 320, 331, 12, 350}, CCase{600, 1000, 600, 610, 11, 630}}) {
         SCOPED_TRACE(c.mFirst);
         const CLinePlan aCut = fqorvCutPlan(aPlan, c.mFirst, c.mCount);
         ASSERT_EQ(aCut.mProducts.size(), 1u);
         const CPlannedProduct& p = aCut.mProducts.front();
-        int64_t aLines = 0;
-        EXPECT_TRUE(fChainFollows(p, aLines));
+        EXPECT_TRUE(fChainFollows(p));
         EXPECT_EQ(p.mFirstRecord, c.mFirstRecord);
         EXPECT_EQ(p.mLastRecord, c.mLastRecord);
         EXPECT_EQ(p.mPulses, c.mPulses);
@@ -262,24 +263,6 @@ TEST(LinePlan, CutRenumbersFromTheFirstLineTheChainKeeps)
     }
     fFailure(CQORV_ERR_IMPORT_OPTION, [&] { fqorvCutPlan(aPlan, 611, 10); });
     fFailure(CQORV_ERR_IMPORT_OPTION, [&] { fqorvCutPlan(aPlan, 312, 8); });   // repeats only
-}
-
-TEST(LinePlan, AFullFrameIsPlannedInMilliseconds)
-{
-    // 28,000 records with gaps, repeats and garbled codes throughout.
-    std::vector<int64_t> aPulses;
-    for (int64_t k = 0; aPulses.size() < 28000; ++k)
-        if (k % 997 != 0 || k == 0) aPulses.push_back(k % 5003 == 0 ? k - 1 : k + (k / 3001) * 40);
-    std::vector<CRecordCodes> aCodes = fRecords(aPulses);
-    for (size_t i = 123; i < aCodes.size(); i += 1009) aCodes[i].mSwst = 4000, aCodes[i].mPri = 7;
-    const auto aStart = std::chrono::steady_clock::now();
-    const CLinePlan aPlan = fqorvPlanLines(aCodes, fArchive());
-    const double aMs = std::chrono::duration<double, std::milli>(std::chrono::steady_clock::now() - aStart).count();
-    RecordProperty("plan_ms", std::to_string(aMs));
-    std::printf("28000 records planned in %.2f ms\n", aMs);
-    EXPECT_EQ(aPlan.mProducts.size(), 1u);
-    EXPECT_LT(aMs, 250.0);   // a loose bound that a pass quadratic in the records would break
-    EXPECT_EQ(fFailure(CQORV_ERR_IMPORT_NO_LINES, [] { fqorvPlanLines(fRecords(fPulses(0, 31)), fArchive()); }).empty(), false);
 }
 
 }  // namespace
