@@ -56,6 +56,7 @@ struct CPlannedProduct {
 };
 
 struct CLinePlan {
+    int64_t mRecords = 0;             // whole records of the data file planned
     std::vector<CPlannedProduct> mProducts;
     std::vector<std::string> mNotes;  // about the whole file (records left out, products too short)
     std::vector<std::string> mWarnings;   // the clock fell back to the scene time (warning 195843)
@@ -74,7 +75,8 @@ struct CLinePlan {
 /// Failures (CImportFailure): 979205 when no PRI code of a product lies in the valid PRF band or
 /// no SWST code in 500 .. 1500; 979206 when the clock goes backwards (more than one record in a
 /// hundred off the median, the parameter naming the first record where the clock falls back);
-/// 979209 when no product remains.
+/// 979209 when no product remains; 979210 when a product has no clock reading and the archive
+/// states no scene time.
 CLinePlan fqorvPlanLines(const std::vector<CRecordCodes>& theCodes, const CNativeArchive& theArchive);
 
 /// Cuts a plan to the records [theFirst, theFirst + theCount) of the data file: lines of other
