@@ -150,9 +150,11 @@ bool Scene::prepare()
 /// the working directory. Its status, when it failed, is the scene's.
 void Scene::runImport() const
 {
-    std::vector<std::string> a = {mImporter.string(), "--out", mWork.string(), "--lines",
-                                  std::to_string(mInput.mFirstRecord) + ":" + std::to_string(mInput.mRecordCount),
-                                  "--json", (mWork / "import.json").string(), "--quiet", "--config", mConfig.string()};
+    std::vector<std::string> a = {mImporter.string(), "--out", mWork.string(), "--json", (mWork / "import.json").string(),
+                                  "--quiet", "--config", mConfig.string()};
+    // An archive of several products is imported one product per scene.
+    if (mInput.mRecordCount > 0)
+        a.insert(a.end(), {"--lines", std::to_string(mInput.mFirstRecord) + ":" + std::to_string(mInput.mRecordCount)});
     if (!mOptions.mOrbit.empty()) a.insert(a.end(), {"--orbit", mOptions.mOrbit.string()});
     if (!mOptions.mAux.empty()) a.insert(a.end(), {"--aux", mOptions.mAux.string()});
     a.push_back(mInput.mArchive.string());
@@ -288,7 +290,7 @@ void Scene::finish(int theStatus)
     // The imported raw product is an intermediate file of the scene.
     if (!mInput.mArchive.empty() && !mOptions.mKeepIntermediate) {
         std::error_code e;
-        for (const char* x : {"", ".sml", "_old.sml", ".part"}) fs::remove(mLocalRaw.string() + x, e);
+        for (const char* x : {"", ".sml", "_old.sml", ".hdr", ".part"}) fs::remove(mLocalRaw.string() + x, e);
     }
     unlock();
 }

@@ -32,8 +32,8 @@ struct SceneInput {
     fs::path mArchive;             // a native archive; empty for a raw product
     std::string mName;             // NAME of the scene's products
     std::string mFormat;           // the archive's format
-    long long mFirstRecord = 0;    // the archive's records that make the product
-    long long mRecordCount = 0;
+    long long mFirstRecord = 0;    // the archive's records that make the product; a count of 0:
+    long long mRecordCount = 0;    // the archive's only product, all of it
 };
 
 struct SceneResult {

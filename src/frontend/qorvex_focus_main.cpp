@@ -141,8 +141,11 @@ std::vector<std::unique_ptr<Scene>> makeScenes(const Options& o, const fs::path&
         q.mAuxFile = o.mAux;
         q.mWrite = false;
         try {
-            for (const CImportedProduct& p : fqorvImport(q).mProducts)
-                add(SceneInput{{}, r, p.mName, "", p.mFirstRecord, p.mLastRecord - p.mFirstRecord + 1});
+            const CImportReport aReport = fqorvImport(q);
+            const bool aSeveral = aReport.mProducts.size() > 1;
+            for (const CImportedProduct& p : aReport.mProducts)
+                add(SceneInput{{}, fs::absolute(r), p.mName, aReport.mFormat, p.mFirstRecord,
+                               aSeveral ? p.mLastRecord - p.mFirstRecord + 1 : 0});
         } catch (const CImportFailure& e) {
             SceneInput aInput{{}, r, r.filename().string(), "", 0, 0};
             aScenes.push_back(std::make_unique<Scene>(o, aInput, theDriver, theImporter, theConfig));
@@ -180,7 +183,7 @@ CJson summaryJson(const std::vector<std::unique_ptr<Scene>>& theScenes, bool the
         o["name"] = s->name();
         o["raw"] = s->localRaw().string();
         o["source"] = s->source().string();
-        o["source_format"] = s->input().mArchive.empty() ? "raw product" : "archive";
+        o["source_format"] = s->input().mArchive.empty() ? "raw product" : s->input().mFormat;
         CJson& n = o["import_notes"] = CJson::array();
         for (const std::string& x : r.mImportNotes) n.push(x);
         o["state"] = stateWord(r.mState);

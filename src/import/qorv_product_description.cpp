@@ -74,6 +74,10 @@ void describeRadar(const CNativeArchive& a, const CPlannedProduct& p, CProductDe
     d.mNearRange = 0.5 * c * d.mFirstDelay;
     d.mCentreRange = d.mNearRange + 0.5 * d.mSamples * d.mRangeSpacing;
     d.mFarRange = d.mNearRange + (d.mSamples - 1) * d.mRangeSpacing;
+    // Range compression keeps the samples the whole chirp covers: the focused image is the window
+    // less the chirp's length.
+    const int aCompressed = std::max(1, d.mSamples - static_cast<int>(std::ceil(d.mSamplingRate * d.mPulseLength)));
+    d.mSceneRange = d.mNearRange + 0.5 * aCompressed * d.mRangeSpacing;
     d.mStartTime = p.mFirstPulseTime;
     d.mStopTime = p.mFirstPulseTime + static_cast<double>(p.mPulses - 1) / d.mPrf;
 }
@@ -168,15 +172,15 @@ void describeCentre(const CNativeArchive& a, const CStateVectorOrbit& theOrbit, 
 {
     const double aMiddle = 0.5 * (d.mStartTime + d.mStopTime);
     CZeroDopplerPoint p;
-    if (!fqorvZeroDopplerPoint(theOrbit, aMiddle, d.mCentreRange, 0.0, CQORV_ERS_LOOK_SIGN, p))
+    if (!fqorvZeroDopplerPoint(theOrbit, aMiddle, d.mSceneRange, 0.0, CQORV_ERS_LOOK_SIGN, p))
         fqorvImportFail(CQORV_ERR_IMPORT_VALUE, format("the window (slant range %.3f km at mid swath) reaches no ground from the orbit",
-                                                       d.mCentreRange * 1e-3));
+                                                       d.mSceneRange * 1e-3));
     d.mCentreLatitude = p.mLatitudeDeg;
     d.mCentreLongitude = p.mLongitudeDeg;
     d.mIncidenceDeg = p.mIncidenceDeg;
     d.mLookDeg = p.mLookDeg;
     d.mHeadingDeg = p.mHeadingDeg;
-    d.mProcessingVelocity = fqorvEffectiveVelocity(theOrbit, aMiddle, d.mCentreRange, 0.0, CQORV_ERS_LOOK_SIGN);
+    d.mProcessingVelocity = fqorvEffectiveVelocity(theOrbit, aMiddle, d.mSceneRange, 0.0, CQORV_ERS_LOOK_SIGN);
     const COrbitState s = theOrbit.at(aMiddle);
     const double aSpeed = std::sqrt(s.mVelocity[0] * s.mVelocity[0] + s.mVelocity[1] * s.mVelocity[1] + s.mVelocity[2] * s.mVelocity[2]);
     // The effective velocity is about the geometric mean of the satellite's and the beam's ground speed.

@@ -26,9 +26,11 @@ struct CProductDescription {
     double mFirstDelay = 0.0;         // s
     double mNearRange = 0.0, mCentreRange = 0.0, mFarRange = 0.0;   // m
     double mRangeSpacing = 0.0;       // m, c / (2 fs)
+    double mSceneRange = 0.0;         // m, the middle of the range compressed swath (the window less
+                                      // the chirp's samples): the focused image's mid range
     // Times, s from the archive's reference day: the transmit times of the first and last pulse.
     double mStartTime = 0.0, mStopTime = 0.0;
-    // The scene centre: middle pulse, middle range, zero Doppler, on the ellipsoid.
+    // The scene centre: middle pulse, the focused image's mid range, zero Doppler, on the ellipsoid.
     double mCentreLatitude = 0.0, mCentreLongitude = 0.0;    // deg
     double mIncidenceDeg = 0.0, mLookDeg = 0.0, mHeadingDeg = 0.0;
     double mProcessingVelocity = 0.0; // m/s, effective velocity at the centre
