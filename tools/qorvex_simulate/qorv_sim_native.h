@@ -72,7 +72,6 @@
 
 #include <cmath>
 #include <cstdint>
-#include <cstdio>
 #include <filesystem>
 #include <memory>
 #include <string>
@@ -211,3 +210,41 @@ std::unique_ptr<CSimNativeWriter> fqorvSimOpenNativeWriter(CSimNativeFormat theF
 /// from the sensing start, its duration and the orbit.
 std::string fqorvSimEnvisatProductName(const CSimNativeProduct& theProduct, double theSensingStart,
                                        double theSensingStop);
+
+// ---- The simulator's scenes as native archives --------------------------------------------------
+
+class CJson;
+class CSimOrbit;
+class CSimTimeline;
+struct CSimRecord;
+struct CSimScene;
+struct CSimSceneTruth;
+
+/// The simulated on-board clock of a completed scene, times in s from the midnight of the scene's
+/// epoch day: a 32-bit count of 1/256 s ticks whose reference pair lies about 1500 s before the
+/// first pulse, its UTC on a whole millisecond and on a tick edge (so the leader's millisecond text
+/// is exact).
+CNativeClock fqorvSimSceneClock(const CSimScene& theScene, const CSimTimeline& theTimeline);
+/// The clock's count at theTime (s from the same midnight): the tick edge at or before it.
+uint32_t fqorvSimClockTicks(const CNativeClock& theClock, double theTime);
+
+/// What the archive of a completed scene states: the scene's radar values, the truth's scene
+/// centre, the clock, and the state vectors (CEOS: five, spanning the scene with one vector of
+/// margin at each end; ENVISAT format: one, at the scene centre's time to the microsecond).
+CSimNativeProduct fqorvSimSceneProduct(const CSimScene& theScene, const CSimTimeline& theTimeline,
+                                       const CSimOrbit& theOrbit, const CSimSceneTruth& theTruth);
+
+/// The codes of one record: the low 24 bits of the line counter, the clock latched at the latest
+/// pulse whose index is a multiple of 4, the window and PRI codes of the pulse, and the scene's
+/// garbage for that pulse.
+CSimNativeLine fqorvSimSceneLine(const CSimScene& theScene, const CSimTimeline& theTimeline, const CNativeClock& theClock,
+                                 const CSimRecord& theRecord);
+
+/// The archive's path for an output root: the directory theRoot (CEOS), or theRoot.E2 (.E1 for
+/// ERS-1).
+std::filesystem::path fqorvSimArchivePath(const CSimScene& theScene, const std::string& theRoot);
+
+/// Adds to a scene's truth file what the archive holds: its format and layout, the clock, the
+/// window grid, the state vectors written, and the garbage written into records (events.garbage).
+void fqorvSimAddArchiveTruth(CJson& theTruth, const CSimScene& theScene, const CSimTimeline& theTimeline,
+                             const CSimNativeProduct& theProduct, const std::filesystem::path& theArchive);
