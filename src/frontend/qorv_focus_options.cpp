@@ -24,16 +24,18 @@ const char* ok(bool b) { return b ? "OK" : "NotOK"; }
 
 std::string helpText()
 {
-    return "usage: qorvex-focus [options] RAW [RAW ...]\n"
+    return "usage: qorvex-focus [options] INPUT [INPUT ...]\n"
            "\n"
-           "Focuses each raw product RAW (a raw raster with its header RAW.sml) through the whole chain:\n"
-           "parameters, Doppler centroid, range compression, Doppler ambiguity, three autofocus runs,\n"
-           "omega-k focusing, multi-look and TIFF. The raw products are only read: each scene runs on a copy\n"
-           "of its header in the output directory.\n"
+           "Focuses each INPUT through the whole chain: parameters, Doppler centroid, range compression,\n"
+           "Doppler ambiguity, three autofocus runs, omega-k focusing, multi-look and TIFF. An INPUT is a raw\n"
+           "product (a raw raster RAW with its header RAW.sml) or a native archive that qorvex-import reads\n"
+           "(an ERS CEOS product directory, its data or leader file, an ERS .E1/.E2 file): each product of\n"
+           "the archive is imported into its scene's work directory and focused as a scene of its own. Inputs\n"
+           "are only read: each scene runs on a copy of its header in the output directory.\n"
            "\n"
            "Options (default in brackets):\n"
            "  --out DIR              output directory; a scene's products are DIR/NAME_slc, _pwr, ... where NAME is\n"
-           "                         the raw file's name without \"_raw\" [.]\n"
+           "                         the raw file's name without \"_raw\", or the product's name of the import [.]\n"
            "  --looks RxA            range x azimuth looks of the multi-look step [1x5]\n"
            "  --no-multilook         make the SLC only [multi-look on]\n"
            "  --no-tiff              no TIFF renditions [TIFF on]\n"
@@ -44,6 +46,8 @@ std::string helpText()
            "  --doppler-degree N     azimuth degree of the Doppler table, 0 to 5 [1]\n"
            "  --jobs N               scenes focused at once [1]\n"
            "  --json FILE            write the summary as JSON to FILE [none]\n"
+           "  --orbit FILE           state vectors for the archives' import (qorvex-import --help) [the archive's]\n"
+           "  --aux FILE             instrument file for the archives' import [none]\n"
            "  --config DIR           directory of Qorvex_configuration.ini [$QORVEX_INIT_DIR, else the\n"
            "                         install's etc/, else the build tree's]\n"
            "  --help                 this text\n"
@@ -58,6 +62,12 @@ std::string sceneBase(const fs::path& theRaw)
     std::string aName = theRaw.filename().string();
     if (aName.size() > 4 && aName.compare(aName.size() - 4, 4, "_raw") == 0) aName.resize(aName.size() - 4);
     return aName;
+}
+
+bool isRawProduct(const fs::path& theInput)
+{
+    std::error_code e;
+    return fs::is_regular_file(theInput.string() + ".sml", e) || sceneBase(theInput) != theInput.filename().string();
 }
 
 Options parseOptions(int argc, const char* const* argv)
@@ -97,6 +107,10 @@ Options parseOptions(int argc, const char* const* argv)
             o.mJson = value(i, a);
         } else if (a == "--config") {
             o.mConfig = value(i, a);
+        } else if (a == "--orbit") {
+            o.mOrbit = fs::absolute(value(i, a));
+        } else if (a == "--aux") {
+            o.mAux = fs::absolute(value(i, a));
         } else if (a.size() > 1 && a[0] == '-') {
             throw std::invalid_argument("unknown option " + a + " (qorvex-focus --help lists them)");
         } else {
@@ -104,11 +118,13 @@ Options parseOptions(int argc, const char* const* argv)
         }
     }
     if (o.mHelp) return o;
-    if (o.mRaw.empty()) throw std::invalid_argument("no raw product given (qorvex-focus --help)");
+    if (o.mRaw.empty()) throw std::invalid_argument("no raw product or archive given (qorvex-focus --help)");
     o.mOut = fs::absolute(o.mOut).lexically_normal();  // the driver runs in the scene's working directory
     std::set<std::string> aBases;
     for (const fs::path& r : o.mRaw) {
         std::error_code e;
+        if (!fs::exists(r, e)) throw std::invalid_argument("no raw product or archive " + r.string());
+        if (!isRawProduct(r)) continue;
         if (!fs::is_regular_file(r, e)) throw std::invalid_argument("no raw file " + r.string());
         if (!aBases.insert(sceneBase(r)).second)
             throw std::invalid_argument("two raw products would write the same products " + (o.mOut / sceneBase(r)).string() +

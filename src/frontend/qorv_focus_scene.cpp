@@ -12,6 +12,7 @@
 #include <sstream>
 
 #include "qorv_generic_utility.h"
+#include "qorv_json.h"
 
 namespace qfocus {
 
@@ -67,12 +68,15 @@ std::optional<double> elementValue(const fs::path& theHeader, const std::string&
 
 }  // namespace
 
-Scene::Scene(const Options& theOptions, const fs::path& theRaw, fs::path theDriver, fs::path theConfig)
-    : mOptions(theOptions), mRaw(theRaw), mDriver(std::move(theDriver)), mConfig(std::move(theConfig)), mBase(sceneBase(theRaw))
+Scene::Scene(const Options& theOptions, SceneInput theInput, fs::path theDriver, fs::path theImporter, fs::path theConfig)
+    : mOptions(theOptions), mInput(std::move(theInput)), mDriver(std::move(theDriver)), mImporter(std::move(theImporter)),
+      mConfig(std::move(theConfig)), mBase(mInput.mName)
 {
     mRoot = mOptions.mOut / mBase;
-    mLocalRaw = mOptions.mOut / mRaw.filename();
     mWork = mOptions.mOut / (mBase + ".qorvex");
+    // An archive's product is imported into the scene's working directory; a raw product is linked
+    // into the output directory.
+    mLocalRaw = mInput.mArchive.empty() ? mOptions.mOut / mInput.mRaw.filename() : mWork / (mBase + "_raw");
     mWorkingFile = mWork / "Process.working";
     mArgs = mWork / "arguments.txt";
 }
@@ -95,8 +99,9 @@ void Scene::fail(long theId, const std::string& theText)
 bool Scene::prepare()
 {
     std::error_code e;
-    fs::path aHeader = mRaw.string() + ".sml";
-    if (!fs::is_regular_file(aHeader, e)) {
+    const bool aArchive = !mInput.mArchive.empty();
+    const fs::path aHeader = mInput.mRaw.string() + ".sml";
+    if (!aArchive && !fs::is_regular_file(aHeader, e)) {
         fail(kMissingFile, "the raw file has no header " + aHeader.string());
         return false;
     }
@@ -117,11 +122,15 @@ bool Scene::prepare()
         return false;
     }
     // The chain writes into the raw product's header (PRF changes, the Doppler table): it runs on a
-    // copy beside a link to the raster, so that the archive is only read.
+    // copy beside a link to the raster, so that the archive is only read. An archive's product is
+    // the import's own.
     const fs::path aLocalHeader = mLocalRaw.string() + ".sml";
-    if (!fs::equivalent(mRaw, mLocalRaw, e)) {
+    if (aArchive) {
+        for (const char* x : {"", ".sml", "_old.sml", ".part"}) fs::remove(mLocalRaw.string() + x, e);
+        fs::remove(mWork / "import.json", e);
+    } else if (!fs::equivalent(mInput.mRaw, mLocalRaw, e)) {
         fs::remove(mLocalRaw, e);
-        fs::create_symlink(fs::absolute(mRaw), mLocalRaw, e);
+        fs::create_symlink(fs::absolute(mInput.mRaw), mLocalRaw, e);
         if (!e) fs::copy_file(aHeader, aLocalHeader, fs::copy_options::overwrite_existing, e);
         if (e) {
             fail(kCreateFile, "cannot place the raw product in " + mOptions.mOut.string() + ": " + e.message());
@@ -129,11 +138,37 @@ bool Scene::prepare()
         }
         fs::remove(mLocalRaw.string() + "_old.sml", e);  // a backup of an earlier run's header copy
     }
-    if (!writeText(mArgs, argumentsFile(mOptions, mLocalRaw, mRoot)) || !writeText(mWorkingFile, "0\nwaiting\n")) {
+    if (!writeText(mArgs, argumentsFile(mOptions, mLocalRaw, mRoot)) ||
+        !writeText(mWorkingFile, aArchive ? "0\nimport\n" : "0\nwaiting\n")) {
         fail(kCreateFile, "cannot write in " + mWork.string());
         return false;
     }
     return true;
+}
+
+/// In the scene's process, before the driver: imports the archive's records of this scene into
+/// the working directory. Its status, when it failed, is the scene's.
+void Scene::runImport() const
+{
+    std::vector<std::string> a = {mImporter.string(), "--out", mWork.string(), "--lines",
+                                  std::to_string(mInput.mFirstRecord) + ":" + std::to_string(mInput.mRecordCount),
+                                  "--json", (mWork / "import.json").string(), "--quiet", "--config", mConfig.string()};
+    if (!mOptions.mOrbit.empty()) a.insert(a.end(), {"--orbit", mOptions.mOrbit.string()});
+    if (!mOptions.mAux.empty()) a.insert(a.end(), {"--aux", mOptions.mAux.string()});
+    a.push_back(mInput.mArchive.string());
+    std::vector<char*> aArgv;
+    for (std::string& x : a) aArgv.push_back(x.data());
+    aArgv.push_back(nullptr);
+    const pid_t aPid = fork();
+    if (aPid == 0) {
+        execv(aArgv[0], aArgv.data());
+        _exit(127);
+    }
+    int aStatus = 0;
+    if (aPid < 0 || waitpid(aPid, &aStatus, 0) != aPid) _exit(127);
+    const int aExit = WIFEXITED(aStatus) ? WEXITSTATUS(aStatus) : 128 + WTERMSIG(aStatus);
+    // 0: imported; 1: imported with warnings, which the summary reports.
+    if (aExit > 1) _exit(aExit);
 }
 
 void Scene::start()
@@ -154,6 +189,7 @@ void Scene::start()
         setenv("QORVEX_WORKING_FILE", mWorkingFile.c_str(), 1);
         if (mLock >= 0) fcntl(mLock, F_SETFD, 0);  // the driver holds the scene's lock with it
         if (chdir(mWork.c_str()) != 0) _exit(127);
+        if (!mInput.mArchive.empty()) runImport();
         execl(mDriver.c_str(), mDriver.c_str(), mArgs.c_str(), static_cast<char*>(nullptr));
         _exit(127);
     }
@@ -248,7 +284,41 @@ void Scene::finish(int theStatus)
         }
     }
     collect();
+    if (!mInput.mArchive.empty()) readImport();
+    // The imported raw product is an intermediate file of the scene.
+    if (!mInput.mArchive.empty() && !mOptions.mKeepIntermediate) {
+        std::error_code e;
+        for (const char* x : {"", ".sml", "_old.sml", ".part"}) fs::remove(mLocalRaw.string() + x, e);
+    }
     unlock();
+}
+
+/// What the import of an archive's product said: its notes and warnings, and its failure, which
+/// is the scene's when the driver never ran.
+void Scene::readImport()
+{
+    std::error_code e;
+    const fs::path aPath = mWork / "import.json";
+    if (!fs::is_regular_file(aPath, e)) return;
+    try {
+        const CJson j = CJson::parseFile(aPath.string());
+        const CJson& x = j["inputs"][std::size_t{0}];
+        if (x.has("notes"))
+            for (const CJson& n : x["notes"].elements()) mResult.mImportNotes.push_back(n.string());
+        if (x.has("products"))
+            for (const CJson& p : x["products"].elements())
+                for (const CJson& n : p["notes"].elements()) mResult.mImportNotes.push_back(n.string());
+        if (x.has("warnings"))
+            for (const CJson& w : x["warnings"].elements())
+                mResult.mWarnings.push_back(std::to_string(static_cast<long>(w["id"].number())) + " " + w["text"].string() + ": " +
+                                            w["parameter"].string());
+        if (x.has("failure") && !x["failure"].isNull()) {
+            const CJson& f = x["failure"];
+            fail(static_cast<long>(f["id"].number()), "import: " + f["text"].string() + ": " + f["parameter"].string());
+        }
+    } catch (const std::exception&) {
+        // An import that ended before its report: the driver's status and words stand.
+    }
 }
 
 void Scene::collect()

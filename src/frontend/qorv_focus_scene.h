@@ -1,6 +1,7 @@
 // One scene of qorvex-focus: its place in the output directory (a copy of the raw header beside a
-// link to the raw raster, a working directory), one run of the focusing driver in a process group
-// of its own, its progress from the working file, and what it made.
+// link to the raw raster, or the product imported from a native archive into its working
+// directory), one run of the focusing driver in a process group of its own (after the import, when
+// there is one), its progress from the working file, and what it made.
 #pragma once
 
 #include <sys/types.h>
@@ -25,6 +26,16 @@ struct Product {
     std::uintmax_t mBytes = 0;
 };
 
+/// What a scene focuses: a raw product, or one product of a native archive.
+struct SceneInput {
+    fs::path mRaw;                 // a raw product; empty for an archive's product
+    fs::path mArchive;             // a native archive; empty for a raw product
+    std::string mName;             // NAME of the scene's products
+    std::string mFormat;           // the archive's format
+    long long mFirstRecord = 0;    // the archive's records that make the product
+    long long mRecordCount = 0;
+};
+
 struct SceneResult {
     SceneState mState = SceneState::Waiting;
     int mExitStatus = -1;            // the driver's exit status
@@ -36,13 +47,15 @@ struct SceneResult {
     std::optional<int> mAmbiguity;   // PRF cycles added
     std::optional<double> mVelocity; // m/s, the processing velocity after autofocus
     std::vector<std::pair<std::string, double>> mSteps;  // step title, seconds, as the driver timed them
+    std::vector<std::string> mImportNotes;  // what the import found and handled
     double mSeconds = 0.0;
 };
 
 class Scene {
 public:
-    /// theDriver: the qorvex program; theConfig: the directory of its configuration.
-    Scene(const Options& theOptions, const fs::path& theRaw, fs::path theDriver, fs::path theConfig);
+    /// theDriver, theImporter: the qorvex and qorvex-import programs; theConfig: the directory of
+    /// their configuration.
+    Scene(const Options& theOptions, SceneInput theInput, fs::path theDriver, fs::path theImporter, fs::path theConfig);
     ~Scene();
     Scene(const Scene&) = delete;
     Scene& operator=(const Scene&) = delete;
@@ -50,6 +63,8 @@ public:
     /// Makes the scene's place in the output directory; false (the scene has failed, with its
     /// words and id) when the raw file has no header or the directory cannot be written.
     bool prepare();
+    /// A scene that fails before it runs (its archive cannot be read, its name is taken).
+    void failBeforeStart(long theId, const std::string& theText) { fail(theId, theText); }
     /// Starts the driver.
     void start();
     /// Follows the working file and reaps the driver; true once the run has ended.
@@ -59,7 +74,11 @@ public:
     /// Ends the driver's process group at once, and removes what it left half-written.
     void kill();
 
-    const fs::path& raw() const { return mRaw; }
+    /// The input as given: the raw product or the archive.
+    const fs::path& source() const { return mInput.mArchive.empty() ? mInput.mRaw : mInput.mArchive; }
+    const SceneInput& input() const { return mInput; }
+    /// The raw product the driver reads (in the output directory, or imported into the work directory).
+    const fs::path& localRaw() const { return mLocalRaw; }
     const std::string& name() const { return mBase; }
     const SceneResult& result() const { return mResult; }
     const fs::path& argumentsPath() const { return mArgs; }
@@ -74,9 +93,12 @@ private:
     void finish(int theStatus);
     void collect();
     void unlock();
+    void runImport() const;
+    void readImport();
 
     const Options& mOptions;
-    fs::path mRaw, mDriver, mConfig;
+    SceneInput mInput;
+    fs::path mDriver, mImporter, mConfig;
     std::string mBase;
     fs::path mRoot, mLocalRaw, mWork, mWorkingFile, mArgs;
     pid_t mPid = -1;

@@ -10,6 +10,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <memory>
+#include <set>
 #include <stdexcept>
 #include <string>
 #include <thread>
@@ -17,6 +18,9 @@
 
 #include "qorv_focus_options.h"
 #include "qorv_focus_scene.h"
+#include "qorv_import.h"
+#include "qorv_import_failure.h"
+#include "qorv_program_config.h"
 #include "qorv_json.h"
 
 using namespace qfocus;
@@ -26,23 +30,6 @@ namespace {
 volatile std::sig_atomic_t gInterrupts = 0;
 
 void onInterrupt(int) { gInterrupts = gInterrupts + 1; }
-
-/// The directory of the configuration: --config, $QORVEX_INIT_DIR, the install's etc/ beside
-/// bin/, the build tree's.
-fs::path findConfig(const Options& o, const fs::path& theExeDir)
-{
-    std::vector<fs::path> aPlaces;
-    if (!o.mConfig.empty()) aPlaces.push_back(o.mConfig);
-    if (const char* e = std::getenv("QORVEX_INIT_DIR"); e && *e) aPlaces.emplace_back(e);
-    aPlaces.push_back(theExeDir.parent_path() / "etc");
-#ifdef QORVEX_FOCUS_BUILD_ETC
-    aPlaces.emplace_back(QORVEX_FOCUS_BUILD_ETC);
-#endif
-    std::error_code e;
-    for (const fs::path& p : aPlaces)
-        if (fs::is_regular_file(p / "Qorvex_configuration.ini", e)) return fs::absolute(p);
-    throw std::invalid_argument("no Qorvex_configuration.ini found (give --config DIR, or write one with qorvex-make-config)");
-}
 
 std::string clock(double s)
 {
@@ -130,13 +117,49 @@ private:
     std::vector<std::string> mLast;
 };
 
+/// The scenes of the inputs: one per raw product, one per product of each archive (read here to
+/// learn its products' names and records; the import itself runs in each scene's process).
+std::vector<std::unique_ptr<Scene>> makeScenes(const Options& o, const fs::path& theDriver, const fs::path& theImporter,
+                                               const fs::path& theConfig)
+{
+    std::vector<std::unique_ptr<Scene>> aScenes;
+    std::set<std::string> aNames;
+    auto add = [&](SceneInput theInput) {
+        aScenes.push_back(std::make_unique<Scene>(o, theInput, theDriver, theImporter, theConfig));
+        if (!aNames.insert(theInput.mName).second)
+            aScenes.back()->failBeforeStart(CQORV_ERR_IMPORT_OPTION, "another input gives the products " + theInput.mName +
+                                                                         ": focus it into another --out directory");
+    };
+    for (const fs::path& r : o.mRaw) {
+        if (isRawProduct(r)) {
+            add(SceneInput{r, {}, sceneBase(r), {}, 0, 0});
+            continue;
+        }
+        CImportRequest q;
+        q.mInput = r;
+        q.mOrbitFile = o.mOrbit;
+        q.mAuxFile = o.mAux;
+        q.mWrite = false;
+        try {
+            for (const CImportedProduct& p : fqorvImport(q).mProducts)
+                add(SceneInput{{}, r, p.mName, "", p.mFirstRecord, p.mLastRecord - p.mFirstRecord + 1});
+        } catch (const CImportFailure& e) {
+            SceneInput aInput{{}, r, r.filename().string(), "", 0, 0};
+            aScenes.push_back(std::make_unique<Scene>(o, aInput, theDriver, theImporter, theConfig));
+            aScenes.back()->failBeforeStart(e.id(), std::string("import: ") + e.parameter());
+        }
+    }
+    return aScenes;
+}
+
 void printSummary(const std::vector<std::unique_ptr<Scene>>& theScenes)
 {
     for (const auto& s : theScenes) {
         const SceneResult& r = s->result();
-        std::printf("\n== %s (%s): %s in %s\n", s->name().c_str(), s->raw().c_str(), stateWord(r.mState), clock(r.mSeconds).c_str());
+        std::printf("\n== %s (%s): %s in %s\n", s->name().c_str(), s->source().c_str(), stateWord(r.mState), clock(r.mSeconds).c_str());
         if (r.mState != SceneState::Succeeded)
             std::printf("   failure %ld: %s\n", r.mFailureId, r.mFailureText.c_str());
+        for (const std::string& n : r.mImportNotes) std::printf("   import: %s\n", n.c_str());
         for (const std::string& w : r.mWarnings) std::printf("   warning %s\n", w.c_str());
         for (const Product& p : r.mProducts) std::printf("   %-60s %s\n", p.mPath.c_str(), bytes(p.mBytes).c_str());
         if (r.mDoppler) std::printf("   Doppler centroid %.2f Hz\n", *r.mDoppler);
@@ -155,7 +178,11 @@ CJson summaryJson(const std::vector<std::unique_ptr<Scene>>& theScenes, bool the
         const SceneResult& r = s->result();
         CJson o = CJson::object();
         o["name"] = s->name();
-        o["raw"] = s->raw().string();
+        o["raw"] = s->localRaw().string();
+        o["source"] = s->source().string();
+        o["source_format"] = s->input().mArchive.empty() ? "raw product" : "archive";
+        CJson& n = o["import_notes"] = CJson::array();
+        for (const std::string& x : r.mImportNotes) n.push(x);
         o["state"] = stateWord(r.mState);
         o["exit_status"] = r.mExitStatus;
         o["failure_id"] = static_cast<long long>(r.mFailureId);
@@ -199,12 +226,13 @@ int main(int argc, char** argv)
             std::fputs(helpText().c_str(), stdout);
             return 0;
         }
-        aConfig = findConfig(o, aExeDir);
+        aConfig = findConfiguration(o.mConfig, aExeDir);
     } catch (const std::exception& e) {
         std::fprintf(stderr, "qorvex-focus: %s\n", e.what());
         return 2;
     }
     const fs::path aDriver = aExeDir / "qorvex";
+    const fs::path aImporter = aExeDir / "qorvex-import";
 
     struct sigaction aAction {};
     aAction.sa_handler = onInterrupt;
@@ -212,8 +240,7 @@ int main(int argc, char** argv)
     sigaction(SIGINT, &aAction, nullptr);
     sigaction(SIGTERM, &aAction, nullptr);
 
-    std::vector<std::unique_ptr<Scene>> aScenes;
-    for (const fs::path& r : o.mRaw) aScenes.push_back(std::make_unique<Scene>(o, r, aDriver, aConfig));
+    std::vector<std::unique_ptr<Scene>> aScenes = makeScenes(o, aDriver, aImporter, aConfig);
     Progress aProgress(aScenes, isatty(STDOUT_FILENO) != 0);
 
     std::size_t aNext = 0;
@@ -235,6 +262,10 @@ int main(int argc, char** argv)
         // Start scenes while there is room; none after an interrupt.
         while (aHandled == 0 && aRunning < o.mJobs && aNext < aScenes.size()) {
             Scene& s = *aScenes[aNext++];
+            if (s.result().mState == SceneState::Failed) {
+                aProgress.ended(s);
+                continue;
+            }
             if (!s.prepare()) {
                 aProgress.ended(s);
                 continue;

@@ -10,6 +10,11 @@
 
 #include <vector>
 
+/// The Earth's field and rotation of the propagation (WGS-84).
+inline constexpr double CQORV_WGS84_GM = 3.986004418e14;        // m^3/s^2
+inline constexpr double CQORV_WGS84_J2 = 1.08262668e-3;
+inline constexpr double CQORV_EARTH_ROTATION_RATE = 7.2921151467e-5;  // rad/s
+
 /// One state vector.
 struct CStateVector {
     double mTime = 0.0;
@@ -49,7 +54,9 @@ private:
 /// Propagates one state vector through the Earth's central field with its J2 term (WGS-84 GM,
 /// J2 and rotation rate), in the inertial frame that coincides with the Earth-fixed frame at the
 /// vector's time; returns the Earth-fixed states at theTimes (any order, before or after the vector).
-std::vector<CStateVector> fqorvPropagateStateVector(const CStateVector& theVector, const std::vector<double>& theTimes);
+/// theJ2 0 leaves the central field alone.
+std::vector<CStateVector> fqorvPropagateStateVector(const CStateVector& theVector, const std::vector<double>& theTimes,
+                                                    double theJ2 = CQORV_WGS84_J2);
 
 /// The zero-Doppler geometry of one slant range at one time.
 struct CZeroDopplerPoint {

@@ -87,7 +87,7 @@ struct CNativeArchive {
     std::filesystem::path mSource;            // as the user named it
     std::vector<std::filesystem::path> mFiles;   // the files read
     std::string mSensor;                      // "ERS-1" or "ERS-2"
-    std::string mLayout;                      // the variant of the record layout: "PGS/VMP", "CO", "EIC", "CCRS", "ASF", "ENVISAT format"
+    std::string mLayoutName;                  // the variant of the record layout: "PGS/VMP", "CO", "EIC", "CCRS", "ASF", "ENVISAT format"
     std::string mFacility;                    // CEOS "D-PAF", "ESRIN", ...; ENVISAT format: the processing centre
     std::string mProcessor;                   // "PGS-ERS", "VMP", ...; ENVISAT format: the software version
     std::string mProductName;                 // the archive's own name for the product, "" when none

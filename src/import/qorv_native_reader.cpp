@@ -1,1 +1,426 @@
-// (to be written)
+// Recognition of native ERS archives by their content, what the readers of the formats share, and
+// the walk over the line records of a data file.
+#include "qorv_native_reader.h"
+
+#include <fcntl.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cctype>
+#include <cerrno>
+#include <cmath>
+#include <cstdio>
+#include <cstring>
+#include <string>
+#include <vector>
+
+#include "qorv_ceos_records.h"
+#include "qorv_import_failure.h"
+#include "qorv_native_formats.h"
+
+namespace fs = std::filesystem;
+
+// ---------------------------------------------------------------------------------------------
+// Shared by the readers
+
+bool fqorvReadAt(int theFd, uint64_t theOffset, void* theBuffer, std::size_t theCount)
+{
+    auto* aBytes = static_cast<uint8_t*>(theBuffer);
+    while (theCount > 0) {
+        const ssize_t aRead = ::pread(theFd, aBytes, theCount, static_cast<off_t>(theOffset));
+        if (aRead < 0 && errno == EINTR) continue;
+        if (aRead <= 0) {
+            if (aRead == 0) errno = 0;
+            return false;
+        }
+        aBytes += aRead;
+        theOffset += static_cast<uint64_t>(aRead);
+        theCount -= static_cast<std::size_t>(aRead);
+    }
+    return true;
+}
+
+std::vector<uint8_t> fqorvReadFileBytes(const fs::path& theFile, uint64_t theOffset, std::size_t theCount)
+{
+    const int aFd = ::open(theFile.c_str(), O_RDONLY | O_CLOEXEC);
+    if (aFd < 0) fqorvImportFail(CQORV_ERR_MISSING_FILE, theFile.string() + ": " + std::strerror(errno));
+    std::vector<uint8_t> aBytes(theCount);
+    std::size_t aDone = 0;
+    while (aDone < theCount) {
+        const ssize_t aRead = ::pread(aFd, aBytes.data() + aDone, theCount - aDone, static_cast<off_t>(theOffset + aDone));
+        if (aRead < 0 && errno == EINTR) continue;
+        if (aRead < 0) {
+            const std::string aWhy = std::strerror(errno);
+            ::close(aFd);
+            fqorvImportFail(CQORV_ERR_RASTER_READ, theFile.string() + ": " + aWhy);
+        }
+        if (aRead == 0) break;
+        aDone += static_cast<std::size_t>(aRead);
+    }
+    ::close(aFd);
+    aBytes.resize(aDone);
+    return aBytes;
+}
+
+std::string fqorvErsMission(const std::string& theMission)
+{
+    std::string aKey;
+    for (const char c : theMission)
+        if (c != '-' && c != '_' && c != ' ') aKey += static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
+    if (aKey == "E1" || aKey.rfind("ERS1", 0) == 0) return "ERS-1";
+    if (aKey == "E2" || aKey.rfind("ERS2", 0) == 0) return "ERS-2";
+    return "";
+}
+
+void fqorvRefuseOtherMission(const std::string& theMission, int theId, const std::string& theWords)
+{
+    if (!fqorvErsMission(theMission).empty()) return;
+    if (theMission.rfind("ALOS", 0) == 0) fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT, "ALOS PALSAR level 1.0 is not imported yet");
+    fqorvImportFail(theId, theWords);
+}
+
+void fqorvSetErsAuxPositions(CNativeRecordLayout& theLayout, int theCounterPos)
+{
+    theLayout.mCounterPos = theCounterPos;
+    theLayout.mClockPos = theCounterPos - 6;
+    theLayout.mSwstPos = theCounterPos + 4;
+    theLayout.mPriPos = theCounterPos + 6;
+    theLayout.mMarkerPos = theCounterPos - 8;
+    theLayout.mAuxPos = theCounterPos - 18;
+}
+
+namespace {
+
+/// The record's own length as its length field states it.
+uint32_t statedLength(const CNativeRecordLayout& theLayout, const uint8_t* theRecord)
+{
+    const uint8_t* aField = theRecord + theLayout.mLengthPos;
+    const uint32_t aValue = theLayout.mLengthBytes == 2 ? fqorvBigEndianU16(aField) : fqorvBigEndianU32(aField);
+    return aValue + static_cast<uint32_t>(theLayout.mLengthAdd);
+}
+
+/// Bytes from a record's start that hold its length field and its auxiliary block.
+uint32_t codeSpan(const CNativeRecordLayout& theLayout)
+{
+    const int aEnd = std::max({theLayout.mLengthPos + theLayout.mLengthBytes, theLayout.mAuxPos + 26,
+                               theLayout.mCounterPos + 4, theLayout.mClockPos + 4, theLayout.mSwstPos + 2,
+                               theLayout.mPriPos + 2, theLayout.mMarkerPos + 1});
+    return static_cast<uint32_t>(aEnd);
+}
+
+CRecordCodes codesOf(const CNativeRecordLayout& theLayout, const uint8_t* theRecord)
+{
+    CRecordCodes aCodes;
+    aCodes.mCounter = fqorvBigEndianU32(theRecord + theLayout.mCounterPos);
+    aCodes.mClock = fqorvBigEndianU32(theRecord + theLayout.mClockPos);
+    aCodes.mSwst = fqorvBigEndianU16(theRecord + theLayout.mSwstPos);
+    aCodes.mPri = fqorvBigEndianU16(theRecord + theLayout.mPriPos);
+    aCodes.mMarker = theRecord[theLayout.mMarkerPos] == NQORV_ERS::MARKER;
+    return aCodes;
+}
+
+[[noreturn]] void failRecordLength(const CNativeRecordLayout& theLayout, uint64_t theIndex, uint32_t theStated)
+{
+    fqorvImportFail(CQORV_ERR_IMPORT_RECORD_LENGTH,
+                    theLayout.mDataFile.filename().string() + ": record " + std::to_string(theIndex + 1) + " at byte " +
+                        std::to_string(theLayout.mFirstRecord + theIndex * theLayout.mRecordLength) + " states a length of " +
+                        std::to_string(theStated) + " bytes, the descriptor " + std::to_string(theLayout.mRecordLength));
+}
+
+}  // namespace
+
+void fqorvCheckFirstRecords(const CNativeRecordLayout& theLayout, const std::string& theVariant)
+{
+    const std::size_t aCount = static_cast<std::size_t>(std::min<uint64_t>(theLayout.mRecords, 16));
+    std::vector<uint8_t> aRecords(aCount * theLayout.mRecordLength);
+    CNativeRecordFile aFile(theLayout);
+    aFile.read(0, aCount, aRecords.data());
+    const uint32_t aStated = statedLength(theLayout, aRecords.data());
+    if (aStated != theLayout.mRecordLength) failRecordLength(theLayout, 0, aStated);
+    std::size_t aMarked = 0;
+    for (std::size_t i = 0; i < aCount; ++i)
+        if (aRecords[i * theLayout.mRecordLength + static_cast<std::size_t>(theLayout.mMarkerPos)] == NQORV_ERS::MARKER) ++aMarked;
+    if (2 * aMarked < aCount)
+        fqorvImportFail(CQORV_ERR_IMPORT_LAYOUT, theLayout.mDataFile.filename().string() + ": the 0xAA marker at byte " +
+                                                     std::to_string(theLayout.mMarkerPos) + " is missing in " +
+                                                     std::to_string(aCount - aMarked) + " of the first " + std::to_string(aCount) +
+                                                     " records: not the layout " + theVariant);
+}
+
+void fqorvCountRecords(CNativeArchive& theArchive)
+{
+    CNativeRecordLayout& aLayout = theArchive.mLayout;
+    std::error_code aError;
+    const uint64_t aSize = fs::file_size(aLayout.mDataFile, aError);
+    if (aError) fqorvImportFail(CQORV_ERR_RASTER_READ, aLayout.mDataFile.string() + ": " + aError.message());
+    const uint64_t aWhole = aSize > aLayout.mFirstRecord ? (aSize - aLayout.mFirstRecord) / aLayout.mRecordLength : 0;
+    const std::string aName = aLayout.mDataFile.filename().string();
+    if (aWhole == 0)
+        fqorvImportFail(CQORV_ERR_IMPORT_NO_LINES, aName + ": " + std::to_string(aSize) + " bytes hold no whole record of " +
+                                                       std::to_string(aLayout.mRecordLength) + " bytes after the first " +
+                                                       std::to_string(aLayout.mFirstRecord));
+    const uint64_t aDeclared = aLayout.mDeclaredRecords;
+    aLayout.mRecords = aWhole;
+    if (aDeclared == 0) {
+        theArchive.mNotes.push_back(aName + " declares no line count: its " + std::to_string(aWhole) + " whole records are taken");
+    } else if (aWhole < aDeclared) {
+        theArchive.mTruncated = true;
+        theArchive.mNotes.push_back(aName + " is truncated: " + std::to_string(aWhole) + " of " + std::to_string(aDeclared) +
+                                    " declared lines");
+    } else if (aWhole > aDeclared) {
+        aLayout.mRecords = aDeclared;
+        theArchive.mNotes.push_back(aName + " holds " + std::to_string(aWhole - aDeclared) + " whole records beyond the " +
+                                    std::to_string(aDeclared) + " declared lines: left out");
+    }
+}
+
+void fqorvCheckStatedValues(const CNativeArchive& theArchive)
+{
+    const std::string aSource =
+        theArchive.mFiles.empty() ? theArchive.mSource.string() : theArchive.mFiles.front().filename().string();
+    const auto check = [&](double theValue, double theLow, double theHigh, const char* theWhat, const char* theUnit) {
+        if (std::isnan(theValue) || (theValue > theLow && theValue < theHigh)) return;
+        char aText[64];
+        std::snprintf(aText, sizeof aText, "%.9g %s", theValue, theUnit);
+        fqorvImportFail(CQORV_ERR_IMPORT_VALUE, aSource + " states " + theWhat + " of " + aText);
+    };
+    check(theArchive.mWavelength, 0.005, 1.0, "a wavelength", "m");
+    check(theArchive.mSamplingRate, 1.0e6, 1.0e9, "a sampling rate", "Hz");
+    check(theArchive.mPulseLength, 1.0e-7, 1.0e-3, "a pulse length", "s");
+    check(theArchive.mPrf, 100.0, 1.0e5, "a PRF", "Hz");
+    check(std::fabs(theArchive.mChirpRate), 1.0e8, 1.0e15, "a chirp rate (magnitude)", "Hz/s");
+}
+
+// ---------------------------------------------------------------------------------------------
+// Recognition
+
+CNativeFileClass fqorvClassifyNativeFile(const fs::path& theFile)
+{
+    CNativeFileClass aClass;
+    std::error_code aError;
+    const uint64_t aSize = fs::file_size(theFile, aError);
+    const std::vector<uint8_t> aHead = aError ? std::vector<uint8_t>{} : fqorvReadFileBytes(theFile, 0, 16);
+    if (aHead.size() >= 8 && std::memcmp(aHead.data(), "PRODUCT=", 8) == 0) {
+        aClass.mKind = ENativeFileKind::Envisat;
+        aClass.mWhat = "an ENVISAT-format product";
+        return aClass;
+    }
+    if (aHead.size() < CQORV_CEOS_HEADER_BYTES) {
+        aClass.mWhat = "a file of " + std::to_string(aHead.size()) + " bytes";
+        return aClass;
+    }
+    const CCeosRecord aFirst = fqorvCeosRecordHeader(aHead.data(), 0);
+    if (aFirst.mSequence != 1 || aFirst.mLength < CQORV_CEOS_HEADER_BYTES || aFirst.mLength > aSize) {
+        char aBytes[64];
+        std::snprintf(aBytes, sizeof aBytes, "%02x %02x %02x %02x %02x %02x %02x %02x", aHead[0], aHead[1], aHead[2], aHead[3],
+                      aHead[4], aHead[5], aHead[6], aHead[7]);
+        aClass.mWhat = "neither CEOS records nor an ENVISAT-format product (it begins with the bytes " + std::string(aBytes) + ")";
+        return aClass;
+    }
+
+    // A data file: its descriptor is followed by signal data records.
+    const std::vector<uint8_t> aSecond = fqorvReadFileBytes(theFile, aFirst.mLength, CQORV_CEOS_HEADER_BYTES);
+    if (aSecond.size() == CQORV_CEOS_HEADER_BYTES) {
+        const CCeosRecord aRecord = fqorvCeosRecordHeader(aSecond.data(), aFirst.mLength);
+        if (aRecord.mSequence == 2 && aRecord.mType[0] == 50) {
+            aClass.mKind = ENativeFileKind::CeosData;
+            aClass.mWhat = "a CEOS data file";
+            return aClass;
+        }
+    }
+    // A leader: a data set summary among its first records.
+    aClass.mKind = ENativeFileKind::CeosOther;
+    aClass.mWhat = "a CEOS file that is neither a leader nor a data file (first record of types " + aFirst.typeText() + ")";
+    // The walk may stop at a broken record: the records before it tell the kind, reading tells the rest.
+    std::string aStop;
+    const std::vector<CCeosRecord> aRecords = fqorvWalkCeosFile(theFile, 16, &aStop);
+    if (const CCeosRecord* aSummary = fqorvFindCeosRecord(aRecords, 10, 10)) {
+        aClass.mKind = ENativeFileKind::CeosLeader;
+        const CCeosFields aFields = fqorvReadCeosRecord(theFile, *aSummary, "data set summary");
+        aClass.mMission = aFields.length() >= 412 ? aFields.text(396, 16) : "";
+        aClass.mWhat = "a CEOS leader of the mission '" + aClass.mMission + "'";
+    } else if (!aStop.empty()) {
+        aClass.mWhat = "a CEOS file whose records can't be walked (" + aStop + ")";
+    }
+    return aClass;
+}
+
+namespace {
+
+/// Refuses a CEOS leader given (or alone in a directory) of another mission than ERS.
+void refuseOtherMission(const CNativeFileClass& theLeader, const fs::path& theFile)
+{
+    fqorvRefuseOtherMission(theLeader.mMission, CQORV_ERR_IMPORT_UNKNOWN_INPUT,
+                            theFile.string() + " is a CEOS leader of the mission '" + theLeader.mMission +
+                                "': only ERS-1/2 CEOS raw products are imported");
+}
+
+struct CClassifiedFile {
+    fs::path mPath;
+    CNativeFileClass mClass;
+};
+
+/// The regular files of theDirectory but theExcept, classified by content; unreadable ones are left out.
+std::vector<CClassifiedFile> classifyDirectory(const fs::path& theDirectory, const fs::path& theExcept = {})
+{
+    std::vector<CClassifiedFile> aFiles;
+    std::error_code aError;
+    for (const fs::directory_entry& aEntry : fs::directory_iterator(theDirectory, aError)) {
+        if (!aEntry.is_regular_file(aError) || (!theExcept.empty() && fs::equivalent(aEntry.path(), theExcept, aError))) continue;
+        try {
+            aFiles.push_back({aEntry.path(), fqorvClassifyNativeFile(aEntry.path())});
+        } catch (const CImportFailure&) {
+        }
+    }
+    std::sort(aFiles.begin(), aFiles.end(), [](const CClassifiedFile& a, const CClassifiedFile& b) { return a.mPath < b.mPath; });
+    return aFiles;
+}
+
+std::vector<const CClassifiedFile*> ofKind(const std::vector<CClassifiedFile>& theFiles, ENativeFileKind theKind)
+{
+    std::vector<const CClassifiedFile*> aFound;
+    for (const CClassifiedFile& aFile : theFiles)
+        if (aFile.mClass.mKind == theKind) aFound.push_back(&aFile);
+    return aFound;
+}
+
+std::string namesOf(const std::vector<const CClassifiedFile*>& theFiles)
+{
+    std::string aNames;
+    for (const CClassifiedFile* aFile : theFiles) aNames += (aNames.empty() ? "" : ", ") + aFile->mPath.filename().string();
+    return aNames;
+}
+
+/// The ERS leader among theCandidates for theData; an ALOS leader names ALOS, anything else is 979202.
+fs::path leaderFor(const fs::path& theData, const std::vector<CClassifiedFile>& theCandidates)
+{
+    const std::vector<const CClassifiedFile*> aLeaders = ofKind(theCandidates, ENativeFileKind::CeosLeader);
+    std::vector<const CClassifiedFile*> aErs;
+    for (const CClassifiedFile* aLeader : aLeaders)
+        if (!fqorvErsMission(aLeader->mClass.mMission).empty()) aErs.push_back(aLeader);
+    if (aErs.size() == 1) return aErs.front()->mPath;
+    if (aErs.size() > 1)
+        fqorvImportFail(CQORV_ERR_IMPORT_LEADER, "several ERS leaders beside " + theData.string() + ": " + namesOf(aErs));
+    for (const CClassifiedFile* aLeader : aLeaders)
+        fqorvRefuseOtherMission(aLeader->mClass.mMission, CQORV_ERR_IMPORT_LEADER,
+                                "no ERS leader beside " + theData.string() + ": " + aLeader->mPath.filename().string() +
+                                    " is " + aLeader->mClass.mWhat);
+    const std::vector<const CClassifiedFile*> aOthers = ofKind(theCandidates, ENativeFileKind::CeosOther);
+    fqorvImportFail(CQORV_ERR_IMPORT_LEADER, "no CEOS leader beside " + theData.string() +
+                                                 (aOthers.empty() ? std::string() : " (other CEOS files: " + namesOf(aOthers) + ")"));
+}
+
+/// The one CEOS data file among theCandidates (261122 when there is none).
+fs::path dataFileAmong(const std::vector<CClassifiedFile>& theCandidates, const std::string& theWhere)
+{
+    const std::vector<const CClassifiedFile*> aData = ofKind(theCandidates, ENativeFileKind::CeosData);
+    if (aData.empty()) fqorvImportFail(CQORV_ERR_MISSING_FILE, "no CEOS data file " + theWhere);
+    if (aData.size() > 1)
+        fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT, "several CEOS data files " + theWhere + ": " + namesOf(aData) + "; name one");
+    return aData.front()->mPath;
+}
+
+CNativeArchive readDirectory(const fs::path& theDirectory)
+{
+    const std::vector<CClassifiedFile> aFiles = classifyDirectory(theDirectory);
+    const std::vector<const CClassifiedFile*> aLeaders = ofKind(aFiles, ENativeFileKind::CeosLeader);
+    const bool aErsLeader = std::any_of(aLeaders.begin(), aLeaders.end(), [](const CClassifiedFile* theLeader) {
+        return !fqorvErsMission(theLeader->mClass.mMission).empty();
+    });
+    if (!aErsLeader && !aLeaders.empty()) refuseOtherMission(aLeaders.front()->mClass, aLeaders.front()->mPath);
+    if (ofKind(aFiles, ENativeFileKind::CeosData).empty()) {
+        const std::vector<const CClassifiedFile*> aEnvisat = ofKind(aFiles, ENativeFileKind::Envisat);
+        fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT,
+                        theDirectory.string() + " holds no CEOS data file (" + std::to_string(aFiles.size()) + " files" +
+                            (aEnvisat.empty() ? std::string()
+                                              : "; ENVISAT-format products are named one by one: " + namesOf(aEnvisat)) +
+                            ")");
+    }
+    const fs::path aDataFile = dataFileAmong(aFiles, "in " + theDirectory.string());
+    return fqorvReadErsCeos(leaderFor(aDataFile, aFiles), aDataFile);
+}
+
+fs::path directoryOf(const fs::path& theFile)
+{
+    return theFile.has_parent_path() ? theFile.parent_path() : fs::path(".");
+}
+
+}  // namespace
+
+CNativeArchive fqorvReadNativeArchive(const fs::path& theInput)
+{
+    std::error_code aError;
+    if (!fs::exists(theInput, aError)) fqorvImportFail(CQORV_ERR_MISSING_FILE, theInput.string() + " does not exist");
+    CNativeArchive aArchive;
+    if (fs::is_directory(theInput, aError)) {
+        aArchive = readDirectory(theInput);
+    } else {
+        const CNativeFileClass aClass = fqorvClassifyNativeFile(theInput);
+        switch (aClass.mKind) {
+        case ENativeFileKind::Envisat:
+            aArchive = fqorvReadErsEnvisat(theInput);
+            break;
+        case ENativeFileKind::CeosLeader: {
+            refuseOtherMission(aClass, theInput);
+            const fs::path aData = dataFileAmong(classifyDirectory(directoryOf(theInput), theInput), "beside " + theInput.string());
+            aArchive = fqorvReadErsCeos(theInput, aData);
+            break;
+        }
+        case ENativeFileKind::CeosData:
+            aArchive = fqorvReadErsCeos(leaderFor(theInput, classifyDirectory(directoryOf(theInput), theInput)), theInput);
+            break;
+        case ENativeFileKind::CeosOther:
+        case ENativeFileKind::Other:
+            fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT, theInput.string() + " is " + aClass.mWhat);
+        }
+    }
+    aArchive.mSource = theInput;
+    return aArchive;
+}
+
+// ---------------------------------------------------------------------------------------------
+// The line records
+
+CNativeRecordFile::CNativeRecordFile(const CNativeRecordLayout& theLayout) : mLayout(theLayout)
+{
+    mFd = ::open(mLayout.mDataFile.c_str(), O_RDONLY | O_CLOEXEC);
+    if (mFd < 0) fqorvImportFail(CQORV_ERR_MISSING_FILE, mLayout.mDataFile.string() + ": " + std::strerror(errno));
+    ::posix_fadvise(mFd, 0, 0, POSIX_FADV_SEQUENTIAL);
+}
+
+CNativeRecordFile::~CNativeRecordFile()
+{
+    if (mFd >= 0) ::close(mFd);
+}
+
+std::vector<CRecordCodes> CNativeRecordFile::scan(const std::function<void(int)>& theProgress)
+{
+    // One read of the few hundred bytes before the samples per record: the page cache serves them
+    // without copying the samples, which make up 96 % of the file.
+    const uint32_t aSpan = codeSpan(mLayout);
+    std::vector<uint8_t> aPrefix(aSpan);
+    std::vector<CRecordCodes> aCodes;
+    aCodes.reserve(mLayout.mRecords);
+    int aPercent = -1;
+    for (uint64_t i = 0; i < mLayout.mRecords; ++i) {
+        if (!fqorvReadAt(mFd, mLayout.mFirstRecord + i * mLayout.mRecordLength, aPrefix.data(), aSpan))
+            fqorvImportFail(CQORV_ERR_RASTER_READ,
+                            mLayout.mDataFile.string() + ": record " + std::to_string(i + 1) + " can't be read" +
+                                (errno != 0 ? std::string(": ") + std::strerror(errno) : std::string()));
+        const uint32_t aStated = statedLength(mLayout, aPrefix.data());
+        if (aStated != mLayout.mRecordLength) failRecordLength(mLayout, i, aStated);
+        aCodes.push_back(codesOf(mLayout, aPrefix.data()));
+        const int aNewPercent = static_cast<int>((i + 1) * 100 / mLayout.mRecords);
+        if (theProgress && aNewPercent != aPercent) theProgress(aPercent = aNewPercent);
+    }
+    return aCodes;
+}
+
+void CNativeRecordFile::read(uint64_t theFirst, std::size_t theCount, uint8_t* theBuffer)
+{
+    const uint64_t aOffset = mLayout.mFirstRecord + theFirst * mLayout.mRecordLength;
+    if (!fqorvReadAt(mFd, aOffset, theBuffer, theCount * mLayout.mRecordLength))
+        fqorvImportFail(CQORV_ERR_RASTER_READ, mLayout.mDataFile.string() + ": records " + std::to_string(theFirst + 1) + " to " +
+                                                   std::to_string(theFirst + theCount) + " can't be read" +
+                                                   (errno != 0 ? std::string(": ") + std::strerror(errno) : std::string()));
+}
