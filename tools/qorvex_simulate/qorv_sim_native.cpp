@@ -155,7 +155,9 @@ public:
     {
         mFile = std::fopen(thePath.c_str(), "wb");
         if (!mFile) throw std::runtime_error("cannot create " + thePath.string());
-        mBuffer.resize(std::size_t{1} << 22);
+        // A small buffer stays in the processor's cache, where the kernel copies it from fast; a
+        // buffer of megabytes made the copy into the page cache cost half a second per frame.
+        mBuffer.resize(std::size_t{1} << 16);
         std::setvbuf(mFile, mBuffer.data(), _IOFBF, mBuffer.size());
     }
     ~CPartFile()
