@@ -46,11 +46,11 @@ CRecord ceosRecord(uint32_t theSequence, const uint8_t (&theTypes)[4], uint32_t 
     return r;
 }
 
-/// An text field: left-justified, blank padded; a text too long is a fault of the caller.
+/// An field: text left-justified, blank padded.
 void putA(CRecord& r, int theOffset, int theWidth, const std::string& theText)
 {
     if (static_cast<int>(theText.size()) > theWidth || theOffset + theWidth > static_cast<int>(r.size()))
-        throw std::logic_error("CEOS field at " + std::to_string(theOffset) + " cannot hold \"" + theText + "\"");
+        throw std::runtime_error("the CEOS field at " + std::to_string(theOffset) + " cannot hold \"" + theText + "\"");
     std::memset(r.data() + theOffset, ' ', static_cast<std::size_t>(theWidth));
     std::memcpy(r.data() + theOffset, theText.data(), theText.size());
 }
@@ -58,7 +58,8 @@ void putA(CRecord& r, int theOffset, int theWidth, const std::string& theText)
 /// Right-justified in theWidth characters.
 void putRight(CRecord& r, int theOffset, int theWidth, const std::string& theText)
 {
-    if (static_cast<int>(theText.size()) > theWidth) throw std::logic_error("CEOS field overflow: " + theText);
+    if (static_cast<int>(theText.size()) > theWidth)
+        throw std::runtime_error("the CEOS field at " + std::to_string(theOffset) + " cannot hold " + theText);
     putA(r, theOffset, theWidth, std::string(static_cast<std::size_t>(theWidth) - theText.size(), ' ') + theText);
 }
 
@@ -86,7 +87,7 @@ void putF(CRecord& r, int theOffset, int theWidth, double theValue, const char* 
             return;
         }
     }
-    throw std::logic_error("CEOS field at " + std::to_string(theOffset) + " cannot hold " + std::to_string(theValue));
+    throw std::runtime_error("the CEOS field at " + std::to_string(theOffset) + " cannot hold " + std::to_string(theValue));
 }
 
 /// Civil date and time of a time in seconds from the midnight of theDay, rounded to theUnit
@@ -305,7 +306,7 @@ CRecord platformPosition(const CSimNativeProduct& p)
     putI(r, 148, 4, c.mMonth);
     putI(r, 152, 4, c.mDay);
     putI(r, 156, 4, c.mDayOfYear);
-    // Seconds of the first vector's day (the day the reference day's count would pass into).
+    // Seconds of the day of the first vector, whose date stands above.
     putF(r, 160, 22, v.front().mTime - 86400.0 * static_cast<double>(c.mDayNumber - p.mReferenceDay), "", 9);
     putF(r, 182, 22, v[1].mTime - v[0].mTime, "", 9);
     putA(r, 204, 64, "Earth Centred Rotating");
@@ -402,14 +403,14 @@ public:
         if (mProduct.mStateVectors.size() < 2) throw std::runtime_error("a CEOS leader needs at least 2 state vectors");
         fs::remove_all(mPart);
         fs::create_directories(mPart);
-        writeWhole(mPart / CQORV_SIM_CEOS_FILES[0], volumeDirectory(mProduct));
-        writeWhole(mPart / CQORV_SIM_CEOS_FILES[1],
-                   {leaderDescriptor(mProduct), dataSetSummary(mProduct), platformPosition(mProduct),
-                    ceosRecord(4, CQORV_SIM_FACILITY_TYPES, CQORV_SIM_FACILITY, true),
-                    ceosRecord(5, CQORV_SIM_FACILITY_TYPES, CQORV_SIM_FACILITY, true)});
-        writeWhole(mPart / CQORV_SIM_CEOS_FILES[3], nullVolume());
-        mData = std::make_unique<CPartFile>(mPart / CQORV_SIM_CEOS_FILES[2]);
-        mData->append(dataDescriptor(mProduct, mVariant, std::max(0L, mProduct.mDeclaredLines)));
+        try {
+            writeHeaders();
+        } catch (...) {
+            mData.reset();
+            std::error_code e;
+            fs::remove_all(mPart, e);
+            throw;
+        }
         mRecord = ceosRecord(0, CQORV_SIM_SIGNAL_TYPES, mVariant.mRecordLength, false);
         fqorvSimPutBE32(mRecord.data() + 24, static_cast<uint32_t>(mProduct.mSamples));
     }
@@ -447,6 +448,19 @@ public:
     }
 
 private:
+    /// The volume directory, the leader, the null volume and the data file's descriptor.
+    void writeHeaders()
+    {
+        writeWhole(mPart / CQORV_SIM_CEOS_FILES[0], volumeDirectory(mProduct));
+        writeWhole(mPart / CQORV_SIM_CEOS_FILES[1],
+                   {leaderDescriptor(mProduct), dataSetSummary(mProduct), platformPosition(mProduct),
+                    ceosRecord(4, CQORV_SIM_FACILITY_TYPES, CQORV_SIM_FACILITY, true),
+                    ceosRecord(5, CQORV_SIM_FACILITY_TYPES, CQORV_SIM_FACILITY, true)});
+        writeWhole(mPart / CQORV_SIM_CEOS_FILES[3], nullVolume());
+        mData = std::make_unique<CPartFile>(mPart / CQORV_SIM_CEOS_FILES[2]);
+        mData->append(dataDescriptor(mProduct, mVariant, std::max(0L, mProduct.mDeclaredLines)));
+    }
+
     /// Takes away the files of an earlier product under the same name; refuses a directory that
     /// holds anything else.
     void clearDestination() const
@@ -500,7 +514,7 @@ std::string blankLine(std::size_t theWidth) { return std::string(theWidth, ' ') 
 /// Pads a header to theSize bytes with a line of blanks.
 std::string padded(std::string theText, std::size_t theSize)
 {
-    if (theText.size() + 1 > theSize) throw std::logic_error("header text longer than its place");
+    if (theText.size() + 1 > theSize) throw std::runtime_error("a header text is longer than its place");
     if (theText.size() < theSize) theText += blankLine(theSize - theText.size() - 1);
     return theText;
 }
