@@ -78,8 +78,28 @@ void readTargets(CSimScene& s, const std::string& theText)
     fqorvSimApplySceneJson(s, aWrapped);
 }
 
+/// "P[:VALUE],...": garbage of one field at pulses P, each with its value or the field's default.
+void readGarbage(CSimScene& s, CSimGarbageField theField, const std::string& theOption, const std::string& theText)
+{
+    if (s.mArchive == CSimArchive::Raw) bad(theOption + " writes into native archives only (--format ceos or e2)");
+    for (const std::string& aItem : split(theText, ',')) {
+        const std::vector<std::string> p = split(aItem, ':');
+        if (p.size() > 2) bad(theOption + ": expected PULSE or PULSE:VALUE, got \"" + aItem + "\"");
+        CSimGarbage g;
+        g.mField = theField;
+        g.mPulse = toLong(theOption, p[0], 0, 899999);
+        if (p.size() == 2) g.mValue = toLong(theOption, p[1], 0, 4294967295L);
+        s.mFaults.mGarbage.push_back(g);
+    }
+}
+
 /// The options that take a value, and what they do to the scene and the command.
 using Handler = std::function<void(CSimScene&, CSimCommand&, const std::string& theOption, const std::string& theValue)>;
+
+Handler garbageOption(CSimGarbageField theField)
+{
+    return [theField](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { readGarbage(s, theField, o, v); };
+}
 
 const std::map<std::string, Handler>& valueOptions()
 {
@@ -129,6 +149,11 @@ const std::map<std::string, Handler>& valueOptions()
         {"--counter-start", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mCounter0 = toLong(o, v, 0, 4000000000L); }},
         {"--header-offset", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mHeaderOffset = static_cast<int32_t>(toLong(o, v, 0, 1 << 30)); }},
         {"--threads", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) { s.mThreads = static_cast<int>(toLong(o, v, 1, 64)); }},
+        {"--wild-pri", garbageOption(CSimGarbageField::Pri)},
+        {"--wild-swst", garbageOption(CSimGarbageField::Swst)},
+        {"--wild-counter", garbageOption(CSimGarbageField::Counter)},
+        {"--corrupt-clock", garbageOption(CSimGarbageField::Clock)},
+        {"--corrupt-marker", garbageOption(CSimGarbageField::Marker)},
     };
     return aOptions;
 }
@@ -153,16 +178,31 @@ bool isKnownPreset(const std::string& theName)
     return std::find(n.begin(), n.end(), theName) != n.end() || theName == "alos-fbs";
 }
 
+/// The options read in the first pass, before the layers: they take a value and are skipped later.
+bool isLayerOption(const std::string& theOption)
+{
+    return theOption == "--preset" || theOption == "--scene" || theOption == "--format" || theOption == "--ceos-layout";
+}
+
+CSimArchive archiveOf(const std::string& theName)
+{
+    if (theName == "raw") return CSimArchive::Raw;
+    if (theName == "ceos") return CSimArchive::Ceos;
+    if (theName == "e2" || theName == "e1" || theName == "envisat") return CSimArchive::Envisat;
+    bad("--format: unknown format \"" + theName + "\" (raw, ceos, e2)");
+}
+
 }  // namespace
 
 std::string fqorvSimUsage()
 {
     return R"(usage: qorvex_simulate [options]
 
-Simulates a stripmap SAR raw product: ROOT (raw raster), ROOT.sml (header), ROOT_truth.json.
+Simulates a stripmap SAR raw product: ROOT (raw raster), ROOT.sml (header), ROOT_truth.json;
+with --format, an ERS CEOS or ENVISAT-format archive and ROOT_truth.json.
 
 Scene:
-  --preset NAME            ers2 (default), envisat, alos (FBS), alos-fbd
+  --preset NAME            ers2 (default), ers1, envisat, alos (FBS), alos-fbd
   --full-frame             the preset's full frame (ERS-2: 28000 lines x 5616 samples, 300 targets)
   --scene FILE             scene file (JSON, key names of the truth file; a truth file re-simulates its scene)
   --lines N                pulses (lines counted in pulses)
@@ -193,7 +233,16 @@ Faults (at pulse indices):
   --swst-change P:N        from pulse P on the sampling window moves by N codes (ERS: 4 samples a code,
                            the chain follows multiples of 22; ENVISAT and ALOS: samples); repeatable
   --prf-change P:CODE      from pulse P on the PRI code is CODE; repeatable
+Garbage in native archives (pulse lists, each P or P:VALUE; without a value the field's default):
+  --wild-pri LIST          PRI code (default 0)
+  --wild-swst LIST         SWST code (default 4095)
+  --wild-counter LIST      image format counter (default: half the 24-bit range away)
+  --corrupt-clock LIST     on-board time (default: the ticks XOR 0x5A5A5A5A)
+  --corrupt-marker LIST    the 0xAA byte of the auxiliary block (default 0)
 Output:
+  --format raw|ceos|e2     raw product (default); ERS CEOS directory ROOT/; ENVISAT-format ROOT.E2
+                           (ROOT.E1 for ERS-1). ERS scenes only; the truth file is ROOT_truth.json
+  --ceos-layout NAME       facility layout of the CEOS data file: pgs (default), co, eic, ccrs, asf
   --out ROOT               output root (default sim_<preset>)
   --write-doppler          write the true centroid as a one-row Processing.DopCenRangeCoeff
   --velocity-error X       the header's processing velocity is the true one times 1 + X (default 0)
@@ -209,7 +258,7 @@ Output:
 void fqorvSimParseCommandLine(const std::vector<std::string>& theArgs, CSimScene& theScene, CSimCommand& theCommand)
 {
     // First pass: the layers below the options (preset, full frame, scene file) and --help.
-    std::string aPreset, aSceneFile;
+    std::string aPreset, aSceneFile, aFormat = "raw", aLayoutName;
     bool aFull = false;
     for (std::size_t i = 0; i < theArgs.size(); ++i) {
         const std::string& a = theArgs[i];
@@ -218,9 +267,11 @@ void fqorvSimParseCommandLine(const std::vector<std::string>& theArgs, CSimScene
             return;
         }
         if (a == "--full-frame") aFull = true;
-        if ((a == "--preset" || a == "--scene") && i + 1 >= theArgs.size()) bad(a + " needs a value");
+        if (isLayerOption(a) && i + 1 >= theArgs.size()) bad(a + " needs a value");
         if (a == "--preset") aPreset = theArgs[++i];
         if (a == "--scene") aSceneFile = theArgs[++i];
+        if (a == "--format") aFormat = theArgs[++i];
+        if (a == "--ceos-layout") aLayoutName = theArgs[++i];
     }
     CJson aScene;
     if (!aSceneFile.empty()) {
@@ -240,13 +291,19 @@ void fqorvSimParseCommandLine(const std::vector<std::string>& theArgs, CSimScene
     }
     if (aPreset.empty()) aPreset = "ers2";
     if (!fqorvSimApplyPreset(theScene, aPreset, aFull))
-        bad("--preset: unknown preset \"" + aPreset + "\" (ers2, envisat, alos, alos-fbd)");
+        bad("--preset: unknown preset \"" + aPreset + "\" (ers2, ers1, envisat, alos, alos-fbd)");
+    CSimCeosLayout aLayout = CSimCeosLayout::PgsVmp;
+    if (!aLayoutName.empty() && !fqorvSimParseCeosLayout(aLayoutName, aLayout))
+        bad("--ceos-layout: unknown layout \"" + aLayoutName + "\" (pgs, co, eic, ccrs, asf)");
+    const CSimArchive aArchive = archiveOf(aFormat);
+    if (!aLayoutName.empty() && aArchive != CSimArchive::Ceos) bad("--ceos-layout goes with --format ceos");
+    fqorvSimApplyArchive(theScene, aArchive, aLayout);
     if (!aSceneFile.empty()) fqorvSimApplySceneJson(theScene, aScene);
 
     // Second pass: the options, in order.
     for (std::size_t i = 0; i < theArgs.size(); ++i) {
         const std::string& a = theArgs[i];
-        if (a == "--preset" || a == "--scene") {
+        if (isLayerOption(a)) {
             ++i;
             continue;
         }

@@ -49,6 +49,15 @@ void presetErs2(CSimScene& s, bool theFull)
     s.mGrid = theFull ? CSimGridRequest{20, 15} : CSimGridRequest{4, 4};
 }
 
+/// ERS-1: the ERS-2 radar and orbit, an earlier date.
+void presetErs1(CSimScene& s, bool theFull)
+{
+    presetErs2(s, theFull);
+    s.mRadar.mSensorName = "ERS-1";
+    fqorvSimParseIsoDate("1993-03-09T10:21:17.250000", s.mEpoch);
+    s.mCounter0 = 1180411;
+}
+
 void presetEnvisat(CSimScene& s, bool theFull)
 {
     s.mRadar = CSimRadar{};
@@ -242,10 +251,34 @@ void applyFaults(CSimScene& s, const CJson& e)
     if (e.has("prf_changes"))
         for (const CJson& c : e["prf_changes"].elements())
             s.mFaults.mPrfChanges.push_back({static_cast<long>(num(c, "pulse", 0)), static_cast<int>(num(c, "pri_code", 0))});
+    if (e.has("garbage"))
+        for (const CJson& c : e["garbage"].elements()) {
+            CSimGarbage g;
+            g.mPulse = static_cast<long>(num(c, "pulse", 0));
+            if (!fqorvSimParseGarbageField(text(c, "field", ""), g.mField))
+                throw std::runtime_error("scene: events.garbage[].field must be pri, swst, counter, clock or marker");
+            g.mValue = static_cast<long long>(num(c, "value", -1.0));
+            s.mFaults.mGarbage.push_back(g);
+        }
 }
 
 // ------------------------------------------------------------------------------------------------
 // Completion
+
+/// The window of a native ERS archive: an archive states the first sample's delay only as
+/// SWST code x 4 / fs + 9 PRI - 6.622 us, so the window lies on that grid, at the code nearest to the
+/// wanted delay (a given tau_first, else a given code, else the derived delay).
+void snapWindowToCodes(CSimScene& s, double theWantedDelay)
+{
+    const double aUnit = NQORV_ERS::SWST_SAMPLES_PER_CODE / s.mRadar.mSamplingRate;
+    const double aFixed = NQORV_ERS::RANK / s.mRadar.mPrf - NQORV_ERS::DELAY_BIAS;
+    if (!std::isnan(s.mTauFirst) || s.mSwstCode0 < 0)
+        s.mSwstCode0 = static_cast<int>(std::lround(((std::isnan(s.mTauFirst) ? theWantedDelay : s.mTauFirst) - aFixed) / aUnit));
+    s.mTauFirst = s.mSwstCode0 * aUnit + aFixed;
+    if (s.mSwstCode0 < NQORV_ERS::SWST_MIN || s.mSwstCode0 > NQORV_ERS::SWST_MAX)
+        throw std::runtime_error("the window's SWST code " + std::to_string(s.mSwstCode0) + " is outside " +
+                                 std::to_string(NQORV_ERS::SWST_MIN) + " .. " + std::to_string(NQORV_ERS::SWST_MAX));
+}
 
 /// The echo window: opens a whole number of PRIs plus whole SWST codes after the transmit
 /// event, placed so that the scene centre falls in the middle of the compressed swath.
@@ -254,10 +287,14 @@ void deriveWindow(CSimScene& s, double theCentreRange)
     const double fs = s.mRadar.mSamplingRate;
     const double aPri = 1.0 / s.mRadar.mPrf;
     const int spc = std::max(1, s.mPrefix.mSwstSamplesPerCode);
+    const int aWidth = s.mSamples - fqorvSimReplicaPoints(s.mRadar);
+    const double aWanted = 2.0 * (theCentreRange - 0.5 * aWidth * s.mRadar.rangeSpacing()) / CQORV_SIM_LIGHT;
+    if (s.mArchive != CSimArchive::Raw) {
+        snapWindowToCodes(s, aWanted);
+        return;
+    }
     if (std::isnan(s.mTauFirst)) {
-        const int aWidth = s.mSamples - fqorvSimReplicaPoints(s.mRadar);
-        const double aNear = theCentreRange - 0.5 * aWidth * s.mRadar.rangeSpacing();
-        const double aTau = 2.0 * aNear / CQORV_SIM_LIGHT;
+        const double aTau = aWanted;
         const double aRank = std::floor(aTau / aPri);
         const long aCode = std::lround((aTau - aRank * aPri) * fs / spc);
         s.mTauFirst = aRank * aPri + static_cast<double>(aCode) * spc / fs;
@@ -352,6 +389,44 @@ void checkFaults(const CSimScene& s)
         if (c <= 0 || c > 65535) throw std::runtime_error("a PRI code must lie in 1 .. 65535");
         if (s.mPrefix.mPriPos < 0) throw std::runtime_error("this sensor's prefix holds no PRI code");
     }
+    for (const CSimGarbage& g : s.mFaults.mGarbage) {
+        inside(g.mPulse, "garbage", true);
+        if (std::find(s.mFaults.mDroppedPulses.begin(), s.mFaults.mDroppedPulses.end(), g.mPulse) !=
+            s.mFaults.mDroppedPulses.end())
+            throw std::runtime_error("garbage at pulse " + std::to_string(g.mPulse) + ", which is dropped");
+        const long long aTop = g.mField == CSimGarbageField::Marker ? 255
+                               : (g.mField == CSimGarbageField::Pri || g.mField == CSimGarbageField::Swst) ? 65535
+                                                                                                            : 4294967295LL;
+        if (g.mValue > aTop)
+            throw std::runtime_error(std::string("a garbage ") + fqorvSimGarbageName(g.mField) + " is at most " +
+                                     std::to_string(aTop));
+    }
+}
+
+/// What a native ERS archive demands of a scene: ERS 5-bit samples, the format's line width, the
+/// format's radar values where it states none, and the PRF of the PRI code (the only PRF it states).
+void completeNative(CSimScene& s)
+{
+    if (s.mArchive == CSimArchive::Raw) return;
+    CSimRadar& r = s.mRadar;
+    if (s.mCodeBits != 5) throw std::runtime_error("an ERS archive holds 5-bit samples (--bits 5)");
+    if (s.mHeaderOffset != 0) throw std::runtime_error("--header-offset has no place in a native archive");
+    if (s.mArchive == CSimArchive::Envisat) {
+        if (s.mSamples != NQORV_SIM_ENVISAT::SAMPLES)
+            throw std::runtime_error("an ENVISAT-format ERS line holds " + std::to_string(NQORV_SIM_ENVISAT::SAMPLES) +
+                                     " samples, not " + std::to_string(s.mSamples));
+        r.mCarrier = NQORV_ERS::CARRIER;
+        r.mSamplingRate = NQORV_ERS::SAMPLING_RATE;
+        r.mPulseLength = NQORV_ERS::PULSE_LENGTH;
+        r.mBandwidth = NQORV_ERS::CHIRP_RATE * NQORV_ERS::PULSE_LENGTH;
+        r.mUpChirp = true;
+    } else {
+        const CSimCeosVariant& v = fqorvSimCeosVariant(s.mCeosLayout);
+        if (s.mSamples > v.capacity())
+            throw std::runtime_error(std::string("a ") + v.mName + " line record holds at most " +
+                                     std::to_string(v.capacity()) + " samples, not " + std::to_string(s.mSamples));
+    }
+    r.mPrf = fqorvSimPrfOfCode(s.mPrefix, r.mSamplingRate, r.mPriCode);
 }
 
 }  // namespace
@@ -362,12 +437,43 @@ double CSimRadar::wavelength() const { return CQORV_SIM_LIGHT / mCarrier; }
 
 double CSimRadar::rangeSpacing() const { return CQORV_SIM_LIGHT / (2.0 * mSamplingRate); }
 
-std::vector<std::string> fqorvSimPresetNames() { return {"ers2", "envisat", "alos", "alos-fbd"}; }
+std::vector<std::string> fqorvSimPresetNames() { return {"ers2", "ers1", "envisat", "alos", "alos-fbd"}; }
+
+const char* fqorvSimGarbageName(CSimGarbageField theField)
+{
+    static const char* const aNames[5] = {"pri", "swst", "counter", "clock", "marker"};
+    return aNames[static_cast<int>(theField)];
+}
+
+bool fqorvSimParseGarbageField(const std::string& theName, CSimGarbageField& theField)
+{
+    for (int i = 0; i < 5; ++i)
+        if (theName == fqorvSimGarbageName(static_cast<CSimGarbageField>(i))) {
+            theField = static_cast<CSimGarbageField>(i);
+            return true;
+        }
+    return false;
+}
+
+void fqorvSimApplyArchive(CSimScene& theScene, CSimArchive theArchive, CSimCeosLayout theLayout)
+{
+    theScene.mArchive = theArchive;
+    theScene.mCeosLayout = theLayout;
+    if (theArchive == CSimArchive::Raw) return;
+    const std::string& aSensor = theScene.mRadar.mSensorName;
+    if ((aSensor != "ERS-1" && aSensor != "ERS-2") || theScene.mFormat != CSimSampleFormat::Ubyte5Bit)
+        throw std::runtime_error("ERS CEOS and .E1/.E2 archives hold ERS-1 and ERS-2 scenes only, not " + aSensor +
+                                 " (preset \"" + theScene.mPreset + "\")");
+    if (theArchive == CSimArchive::Envisat) theScene.mSamples = NQORV_SIM_ENVISAT::SAMPLES;
+    else theScene.mSamples = std::min(theScene.mSamples, fqorvSimCeosVariant(theLayout).capacity());
+}
 
 bool fqorvSimApplyPreset(CSimScene& theScene, const std::string& theName, bool theFullFrame)
 {
     if (theName == "ers2")
         presetErs2(theScene, theFullFrame);
+    else if (theName == "ers1")
+        presetErs1(theScene, theFullFrame);
     else if (theName == "envisat")
         presetEnvisat(theScene, theFullFrame);
     else if (theName == "alos" || theName == "alos-fbs")
@@ -480,6 +586,7 @@ std::unique_ptr<CSimOrbit> fqorvSimMakeOrbit(const CSimScene& theScene)
 void fqorvSimCompleteScene(CSimScene& s)
 {
     CSimRadar& r = s.mRadar;
+    completeNative(s);
     if (r.mPrf <= 0.0) {
         if (r.mPriCode <= 0) throw std::runtime_error("the PRI code must be positive");
         r.mPrf = fqorvSimPrfOfCode(s.mPrefix, r.mSamplingRate, r.mPriCode);

@@ -15,6 +15,7 @@
 #include <vector>
 
 #include "qorv_sim_geodesy.h"
+#include "qorv_sim_native.h"
 #include "qorv_sim_orbit.h"
 
 class CJson;
@@ -75,13 +76,27 @@ struct CSimTarget {
     double mHeight = 0.0;
 };
 
+/// The fields of a native archive's record that a garbage fault overwrites.
+enum class CSimGarbageField { Pri, Swst, Counter, Clock, Marker };
+
+/// A garbage value in the records of one pulse (both records of a repeated pulse).
+struct CSimGarbage {
+    long mPulse = 0;
+    CSimGarbageField mField = CSimGarbageField::Pri;
+    long long mValue = -1;    // as written; -1: the field's default garbage (see docs/simulator.md)
+};
+
 /// Faults of real archives, all at pulse indices (pulses counted from 0).
 struct CSimFaults {
     std::vector<long> mDroppedPulses;                 // transmitted, never recorded: the counter jumps
     std::vector<long> mRepeatedPulses;                // recorded twice with the same counter
     std::vector<std::pair<long, int>> mSwstChanges;   // from pulse p on the code moves by n codes
     std::vector<std::pair<long, int>> mPrfChanges;    // from pulse p on the PRI code is c
+    std::vector<CSimGarbage> mGarbage;                // native archives only
 };
+
+/// The form a scene is written in: the chain's raw product, or a native ERS archive.
+enum class CSimArchive { Raw, Ceos, Envisat };
 
 /// Target grid request: rows along azimuth, columns along range.
 struct CSimGridRequest {
@@ -92,6 +107,8 @@ struct CSimGridRequest {
 /// Everything that defines a simulated acquisition.
 struct CSimScene {
     std::string mPreset = "ers2";
+    CSimArchive mArchive = CSimArchive::Raw;
+    CSimCeosLayout mCeosLayout = CSimCeosLayout::PgsVmp;
     CSimRadar mRadar;
     CSimSampleFormat mFormat = CSimSampleFormat::Ubyte5Bit;
     CSimPrefixLayout mPrefix;
@@ -173,6 +190,15 @@ double fqorvSimPrfOfCode(const CSimPrefixLayout& theLayout, double theSamplingRa
 int fqorvSimCodeOfPrf(const CSimPrefixLayout& theLayout, double theSamplingRate, double thePrf);
 /// Number of points of the chirp replica: trunc(T fs) + 1.
 int fqorvSimReplicaPoints(const CSimRadar& theRadar);
+
+/// Names of the garbage fields: "pri", "swst", "counter", "clock", "marker".
+const char* fqorvSimGarbageName(CSimGarbageField theField);
+bool fqorvSimParseGarbageField(const std::string& theName, CSimGarbageField& theField);
+
+/// The archive layer of a scene, applied right after the preset: the native formats hold ERS-1/2
+/// scenes only (std::runtime_error otherwise); an ENVISAT-format line holds 5616 samples, a CEOS
+/// record at most its layout's capacity.
+void fqorvSimApplyArchive(CSimScene& theScene, CSimArchive theArchive, CSimCeosLayout theLayout);
 
 /// Derives what the layers left open (orbit placement, window, start time, targets) and checks
 /// the scene; throws std::runtime_error with a clear message when it is inconsistent.

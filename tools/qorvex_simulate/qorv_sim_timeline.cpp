@@ -8,7 +8,8 @@ CSimTimeline::CSimTimeline(const CSimScene& theScene)
       mTauFirst(theScene.mTauFirst),
       mSamplingRate(theScene.mRadar.mSamplingRate),
       mSamplesPerCode(theScene.mPrefix.mSwstSamplesPerCode),
-      mSwstCode0(theScene.mSwstCode0)
+      mSwstCode0(theScene.mSwstCode0),
+      mWindowRank(theScene.mArchive == CSimArchive::Raw ? 0 : NQORV_ERS::RANK)
 {
     // PRI segments: the first PRF, then one segment per change in pulse order.
     std::vector<std::pair<long, int>> aChanges = theScene.mFaults.mPrfChanges;
@@ -64,7 +65,11 @@ int CSimTimeline::swstCode(long k) const
 
 int CSimTimeline::windowShiftSamples(long k) const { return (swstCode(k) - mSwstCode0) * mSamplesPerCode; }
 
-double CSimTimeline::windowDelay(long k) const { return mTauFirst + windowShiftSamples(k) / mSamplingRate; }
+double CSimTimeline::windowDelay(long k) const
+{
+    const double aRankShift = mWindowRank * (segmentOf(k).mPri - mSegments.front().mPri);
+    return mTauFirst + windowShiftSamples(k) / mSamplingRate + aRankShift;
+}
 
 double CSimTimeline::fractionalPulse(double theTime) const
 {

@@ -34,7 +34,9 @@ public:
     /// window in samples (positive: the window opens later).
     int swstCode(long k) const;
     int windowShiftSamples(long k) const;
-    /// Two-way delay (s) from the transmit time of pulse k to its first sample.
+    /// Two-way delay (s) from the transmit time of pulse k to its first sample. In a native ERS
+    /// archive the window is timed from the pulse 9 PRIs earlier, so a PRF change moves it by 9
+    /// times the change of the PRI.
     double windowDelay(long k) const;
 
     /// Fractional pulse index of a time: k + (t - t_k) / (t_{k+1} - t_k), extended linearly
@@ -61,6 +63,7 @@ private:
     double mSamplingRate;
     int mSamplesPerCode;
     int mSwstCode0;
+    int mWindowRank;   // pulses between the one that times the window and the one it receives
     std::vector<PriSegment> mSegments;
     std::vector<std::pair<long, int>> mSwstSteps;  // sorted: from pulse p on, add n codes
     std::vector<CSimRecord> mRecords;

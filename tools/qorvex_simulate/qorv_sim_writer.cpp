@@ -4,6 +4,9 @@
 #include <chrono>
 #include <cmath>
 #include <cstdio>
+#include <filesystem>
+#include <functional>
+#include <memory>
 #include <stdexcept>
 #include <thread>
 #include <vector>
@@ -15,6 +18,7 @@
 #include "qorv_sim_echo.h"
 #include "qorv_sim_format.h"
 #include "qorv_sim_header.h"
+#include "qorv_sim_native.h"
 #include "qorv_sim_timeline.h"
 #include "qorv_sim_truth.h"
 
@@ -87,9 +91,12 @@ CRasterFileParam rasterParam(const CSimScene& s, const CSimTimeline& tl, const s
     return p;
 }
 
-/// Streams all records of the scene into an open raster.
+/// Takes one record: the record, its index in the file and its encoded samples.
+using CRecordSink = std::function<void(const CSimRecord& theRecord, std::size_t theIndex, const uint8_t* theSamples)>;
+
+/// Generates the scene block by block and hands every record, in file order, to theSink.
 void streamRecords(const CSimScene& s, const CSimTimeline& tl, const CSimEchoGenerator& theGenerator, double theGain,
-                   CRasterFile& theRaster, CSimRunReport& theReport, const CSimProgress& theProgress)
+                   const CRecordSink& theSink, CSimRunReport& theReport, const CSimProgress& theProgress)
 {
     const int aThreads = threadCount(s);
     theReport.mThreads = aThreads;
@@ -97,8 +104,6 @@ void streamRecords(const CSimScene& s, const CSimTimeline& tl, const CSimEchoGen
     b.mBytesPerLine = s.mSamples * (s.mFormat == CSimSampleFormat::Ubyte5Bit ? 2 : 8);
     b.mBytes.resize(static_cast<std::size_t>(CQORV_SIM_BLOCK) * b.mBytesPerLine);
     b.mClipped.resize(CQORV_SIM_BLOCK);
-    std::vector<uint8_t> aPixels(static_cast<std::size_t>(b.mBytesPerLine));
-    std::vector<uint8_t> aPrefix(static_cast<std::size_t>(s.mPrefix.mSize));
     const std::vector<CSimRecord>& aRecords = tl.records();
     std::size_t aRecord = 0;
     long aClipped = 0;
@@ -111,18 +116,7 @@ void streamRecords(const CSimScene& s, const CSimTimeline& tl, const CSimEchoGen
         // The records of the block's pulses, in file order (dropped pulses have none).
         for (; aRecord < aRecords.size() && aRecords[aRecord].mPulse < aFirst + b.mCount; ++aRecord) {
             const CSimRecord& r = aRecords[aRecord];
-            CSimPrefixValues v;
-            v.mCounter = r.mCounter;
-            v.mSwstCode = tl.swstCode(r.mPulse);
-            v.mPriCode = tl.priCode(r.mPulse);
-            v.mSlantRange = static_cast<int32_t>(std::lround(0.5 * CQORV_SIM_LIGHT * tl.windowDelay(r.mPulse)));
-            // Seeded by the pulse: a repeated record is a byte-for-byte copy, as in the archives.
-            fqorvSimEncodePrefix(s.mPrefix, v, s.mSeed, static_cast<uint64_t>(r.mPulse), aPrefix.data());
-            theRaster.setRowPrefix(aPrefix.data());
-            // The write swaps the buffer it is given: hand it a copy.
-            const uint8_t* src = b.mBytes.data() + static_cast<std::size_t>(r.mPulse - aFirst) * b.mBytesPerLine;
-            std::copy(src, src + b.mBytesPerLine, aPixels.begin());
-            theRaster.writeLines(static_cast<int>(aRecord), 1, aPixels.data());
+            theSink(r, aRecord, b.mBytes.data() + static_cast<std::size_t>(r.mPulse - aFirst) * b.mBytesPerLine);
         }
         const int aNow = static_cast<int>(100 * (aFirst + b.mCount) / s.mPulses);
         if (theProgress && aNow != aPercent) theProgress(aNow);
@@ -144,22 +138,55 @@ double quantiserGain(const CSimScene& s, const CSimEchoGenerator& g, double& the
     return aComponentPower > 0.0 ? aRms / std::sqrt(aComponentPower) : 1.0;
 }
 
-void writeRasterWith(const CSimScene& s, const CSimTimeline& tl, const CSimEchoGenerator& g, const std::string& thePath,
-                     CSimRunReport& theReport, CSimRunFigures& theFigures, const CSimProgress& theProgress)
+/// The sink of the chain's raw raster: each record's prefix and samples through CRasterFile.
+CRecordSink rasterSink(const CSimScene& s, const CSimTimeline& tl, CRasterFile& theRaster)
 {
-    const auto aStart = std::chrono::steady_clock::now();
+    const int aBytes = s.mSamples * (s.mFormat == CSimSampleFormat::Ubyte5Bit ? 2 : 8);
+    auto aPixels = std::make_shared<std::vector<uint8_t>>(static_cast<std::size_t>(aBytes));
+    auto aPrefix = std::make_shared<std::vector<uint8_t>>(static_cast<std::size_t>(s.mPrefix.mSize));
+    return [&s, &tl, &theRaster, aPixels, aPrefix, aBytes](const CSimRecord& r, std::size_t theIndex, const uint8_t* theSamples) {
+        CSimPrefixValues v;
+        v.mCounter = r.mCounter;
+        v.mSwstCode = tl.swstCode(r.mPulse);
+        v.mPriCode = tl.priCode(r.mPulse);
+        v.mSlantRange = static_cast<int32_t>(std::lround(0.5 * CQORV_SIM_LIGHT * tl.windowDelay(r.mPulse)));
+        // Seeded by the pulse: a repeated record is a byte-for-byte copy, as in the archives.
+        fqorvSimEncodePrefix(s.mPrefix, v, s.mSeed, static_cast<uint64_t>(r.mPulse), aPrefix->data());
+        theRaster.setRowPrefix(aPrefix->data());
+        // The write swaps the buffer it is given: hand it a copy.
+        std::copy(theSamples, theSamples + aBytes, aPixels->begin());
+        theRaster.writeLines(static_cast<int>(theIndex), 1, aPixels->data());
+    };
+}
+
+/// Sets the quantiser's gain and the figures of the echo generator.
+void startFigures(const CSimScene& s, const CSimEchoGenerator& g, CSimRunFigures& theFigures)
+{
     theFigures.mGain = quantiserGain(s, g, theFigures.mSignalPower);
     theFigures.mNoiseVariance = g.noiseVariance();
     theFigures.mAzimuthGain = g.azimuthGain();
     theFigures.mRangeGain = g.rangeGain();
-    CRasterFile aRaster;
-    aRaster.openWrite(CQORV_RF_OPEN_WRITE, rasterParam(s, tl, thePath));
-    streamRecords(s, tl, g, theFigures.mGain, aRaster, theReport, theProgress);
-    aRaster.close();
+}
+
+void writeRecordsWith(const CSimScene& s, const CSimTimeline& tl, const CSimEchoGenerator& g, const CRecordSink& theSink,
+                      CSimRunReport& theReport, CSimRunFigures& theFigures, const CSimProgress& theProgress)
+{
+    const auto aStart = std::chrono::steady_clock::now();
+    startFigures(s, g, theFigures);
+    streamRecords(s, tl, g, theFigures.mGain, theSink, theReport, theProgress);
     theReport.mGain = theFigures.mGain;
     theFigures.mClippedFraction = theReport.mClippedFraction;
     theReport.mPulses = s.mPulses;
     theReport.mEchoSeconds = secondsSince(aStart);
+}
+
+void writeRasterWith(const CSimScene& s, const CSimTimeline& tl, const CSimEchoGenerator& g, const std::string& thePath,
+                     CSimRunReport& theReport, CSimRunFigures& theFigures, const CSimProgress& theProgress)
+{
+    CRasterFile aRaster;
+    aRaster.openWrite(CQORV_RF_OPEN_WRITE, rasterParam(s, tl, thePath));
+    writeRecordsWith(s, tl, g, rasterSink(s, tl, aRaster), theReport, theFigures, theProgress);
+    aRaster.close();
 }
 
 void countTargets(const CSimScene& s, CSimRunReport& r)
@@ -186,8 +213,48 @@ void fqorvSimWriteRaster(const CSimScene& theScene, const std::string& thePath, 
     writeRasterWith(theScene, aTimeline, aGenerator, thePath, theReport, aFigures, theProgress);
 }
 
+namespace {
+
+/// A native archive: records through the archive's writer, the truth file, then the archive
+/// renamed into place.
+CSimRunReport runNative(const CSimScene& theScene, const std::string& theRoot, const CSimProgress& theProgress)
+{
+    const auto aStart = std::chrono::steady_clock::now();
+    CSimRunReport aReport;
+    const std::filesystem::path aArchive = fqorvSimArchivePath(theScene, theRoot);
+    aReport.mRaster = aArchive.string();
+    aReport.mTruth = theRoot + "_truth.json";
+    countTargets(theScene, aReport);
+    std::remove(aReport.mTruth.c_str());
+
+    const std::unique_ptr<CSimOrbit> aOrbit = fqorvSimMakeOrbit(theScene);
+    const CSimTimeline aTimeline(theScene);
+    const CSimEchoGenerator aGenerator(theScene, *aOrbit, aTimeline);
+    const CSimSceneTruth aTruth = fqorvSimComputeTruth(theScene, *aOrbit, aTimeline);
+    const CSimNativeProduct aProduct = fqorvSimSceneProduct(theScene, aTimeline, *aOrbit, aTruth);
+    const std::unique_ptr<CSimNativeWriter> aWriter = fqorvSimOpenNativeWriter(
+        theScene.mArchive == CSimArchive::Ceos ? CSimNativeFormat::Ceos : CSimNativeFormat::Envisat, aProduct, aArchive);
+
+    CSimRunFigures aFigures;
+    const CRecordSink aSink = [&](const CSimRecord& r, std::size_t, const uint8_t* theSamples) {
+        aWriter->writeLine(fqorvSimSceneLine(theScene, aTimeline, aProduct.mClock, r), theSamples);
+    };
+    writeRecordsWith(theScene, aTimeline, aGenerator, aSink, aReport, aFigures, theProgress);
+
+    aFigures.mRasterName = aArchive.filename().string();
+    CJson aTruthJson = fqorvSimTruthJson(theScene, aTruth, aTimeline, *aOrbit, aFigures);
+    fqorvSimAddArchiveTruth(aTruthJson, theScene, aTimeline, aProduct, aArchive);
+    aTruthJson.dumpFile(aReport.mTruth);
+    aWriter->finish();
+    aReport.mSeconds = secondsSince(aStart);
+    return aReport;
+}
+
+}  // namespace
+
 CSimRunReport fqorvSimRun(const CSimScene& theScene, const std::string& theRoot, const CSimProgress& theProgress)
 {
+    if (theScene.mArchive != CSimArchive::Raw) return runNative(theScene, theRoot, theProgress);
     const auto aStart = std::chrono::steady_clock::now();
     CSimRunReport aReport;
     aReport.mRaster = theRoot;

@@ -4,6 +4,9 @@
 // A root R gives R (raster), R.sml and R_truth.json. The raster is written under R.part and renamed
 // at its end, the truth file next, the header last (each atomically): a product whose R.sml exists
 // is complete, and stale files of an earlier run under the same root are removed first.
+// A scene for a native ERS archive gives the archive (the CEOS directory R, or R.E2 / R.E1) and
+// R_truth.json: the archive is written under its ".part" name, the truth file next, and the
+// archive renamed into place last.
 #pragma once
 
 #include <functional>
@@ -13,7 +16,7 @@
 
 /// Figures of a run.
 struct CSimRunReport {
-    std::string mRaster, mHeader, mTruth;  // paths
+    std::string mRaster, mHeader, mTruth;  // paths (a native archive: mRaster, no header)
     long mPulses = 0;
     long mRecords = 0;
     std::size_t mTargets = 0;              // listed targets

@@ -71,7 +71,10 @@ int main(int argc, char** argv)
                 if (p >= 100) std::fputc('\n', stderr);
             };
         const CSimRunReport r = fqorvSimRun(aScene, aCommand.mRoot, aProgress);
-        std::printf("raster   %s\nheader   %s\ntruth    %s\n", r.mRaster.c_str(), r.mHeader.c_str(), r.mTruth.c_str());
+        if (aScene.mArchive == CSimArchive::Raw)
+            std::printf("raster   %s\nheader   %s\ntruth    %s\n", r.mRaster.c_str(), r.mHeader.c_str(), r.mTruth.c_str());
+        else
+            std::printf("archive  %s\ntruth    %s\n", r.mRaster.c_str(), r.mTruth.c_str());
         std::printf("%s: %ld pulses, %ld records x %d samples, %zu targets, %zu scatterers\n",
                     aScene.mRadar.mSensorName.c_str(), r.mPulses, r.mRecords, aScene.mSamples, r.mTargets,
                     r.mScatterers);
