@@ -3,6 +3,7 @@
 #include "qorv_native_reader.h"
 
 #include <fcntl.h>
+#include <sys/uio.h>
 #include <unistd.h>
 
 #include <algorithm>
@@ -12,9 +13,11 @@
 #include <cstdio>
 #include <cstring>
 #include <string>
+#include <thread>
 #include <vector>
 
 #include "qorv_ceos_records.h"
+#include "qorv_generic_utility.h"
 #include "qorv_import_failure.h"
 #include "qorv_native_formats.h"
 
@@ -396,22 +399,46 @@ CNativeRecordFile::~CNativeRecordFile()
 std::vector<CRecordCodes> CNativeRecordFile::scan(const std::function<void(int)>& theProgress)
 {
     // One read of the few hundred bytes before the samples per record: the page cache serves them
-    // without copying the samples, which make up 96 % of the file.
+    // without copying the samples, which make up 96 % of the file. The reads are system calls of
+    // a microsecond each, shared by the threads in contiguous parts; a record that fails is
+    // reported for the earliest record, whatever the thread count.
     const uint32_t aSpan = codeSpan(mLayout);
-    std::vector<uint8_t> aPrefix(aSpan);
-    std::vector<CRecordCodes> aCodes;
-    aCodes.reserve(mLayout.mRecords);
-    int aPercent = -1;
-    for (uint64_t i = 0; i < mLayout.mRecords; ++i) {
+    const uint64_t n = mLayout.mRecords;
+    std::vector<CRecordCodes> aCodes(n);
+    const int aThreads = static_cast<int>(std::clamp<uint64_t>(n / 4096, 1, static_cast<uint64_t>(std::min(fqorvThreadCount(), 4))));
+    std::vector<uint64_t> aFailedAt(static_cast<std::size_t>(aThreads), n);
+    std::vector<int> aErrno(static_cast<std::size_t>(aThreads), 0);
+    auto part = [&](int t) {
+        std::vector<uint8_t> aPrefix(aSpan);
+        const uint64_t a = n * static_cast<uint64_t>(t) / aThreads, b = n * static_cast<uint64_t>(t + 1) / aThreads;
+        int aPercent = -1;
+        for (uint64_t i = a; i < b; ++i) {
+            if (!fqorvReadAt(mFd, mLayout.mFirstRecord + i * mLayout.mRecordLength, aPrefix.data(), aSpan) ||
+                statedLength(mLayout, aPrefix.data()) != mLayout.mRecordLength) {
+                aFailedAt[static_cast<std::size_t>(t)] = i;
+                aErrno[static_cast<std::size_t>(t)] = errno;
+                return;
+            }
+            aCodes[i] = codesOf(mLayout, aPrefix.data());
+            // The first part's progress stands for all: the parts are of one size.
+            const int aNow = static_cast<int>((i + 1 - a) * 100 / (b - a));
+            if (t == 0 && theProgress && aNow != aPercent) theProgress(aPercent = aNow);
+        }
+    };
+    std::vector<std::thread> aPool;
+    for (int t = 1; t < aThreads; ++t) aPool.emplace_back(part, t);
+    part(0);
+    for (std::thread& x : aPool) x.join();
+    for (int t = 0; t < aThreads; ++t) {
+        const uint64_t i = aFailedAt[static_cast<std::size_t>(t)];
+        if (i == n) continue;
+        std::vector<uint8_t> aPrefix(aSpan);
         if (!fqorvReadAt(mFd, mLayout.mFirstRecord + i * mLayout.mRecordLength, aPrefix.data(), aSpan))
             fqorvImportFail(CQORV_ERR_RASTER_READ,
                             mLayout.mDataFile.string() + ": record " + std::to_string(i + 1) + " can't be read" +
-                                (errno != 0 ? std::string(": ") + std::strerror(errno) : std::string()));
-        const uint32_t aStated = statedLength(mLayout, aPrefix.data());
-        if (aStated != mLayout.mRecordLength) failRecordLength(mLayout, i, aStated);
-        aCodes.push_back(codesOf(mLayout, aPrefix.data()));
-        const int aNewPercent = static_cast<int>((i + 1) * 100 / mLayout.mRecords);
-        if (theProgress && aNewPercent != aPercent) theProgress(aPercent = aNewPercent);
+                                (aErrno[static_cast<std::size_t>(t)] != 0 ? std::string(": ") + std::strerror(aErrno[static_cast<std::size_t>(t)])
+                                                                          : std::string()));
+        failRecordLength(mLayout, i, statedLength(mLayout, aPrefix.data()));
     }
     return aCodes;
 }
@@ -423,4 +450,48 @@ void CNativeRecordFile::read(uint64_t theFirst, std::size_t theCount, uint8_t* t
         fqorvImportFail(CQORV_ERR_RASTER_READ, mLayout.mDataFile.string() + ": records " + std::to_string(theFirst + 1) + " to " +
                                                    std::to_string(theFirst + theCount) + " can't be read" +
                                                    (errno != 0 ? std::string(": ") + std::strerror(errno) : std::string()));
+}
+
+void CNativeRecordFile::readIntoLines(uint64_t theFirst, std::size_t theCount, uint8_t* theLines, std::size_t theStride,
+                                      long theShift)
+{
+    // Each record is one or three pieces: the bytes before its line's start and beyond its end go
+    // to a scratch buffer, the rest into the line; one preadv takes up to 300 records.
+    const std::size_t n = mLayout.mRecordLength;
+    const std::size_t aBefore = theShift < 0 ? static_cast<std::size_t>(-theShift) : 0;
+    const std::size_t aStart = theShift > 0 ? static_cast<std::size_t>(theShift) : 0;
+    const std::size_t aInLine = std::min(n - std::min(n, aBefore), theStride - std::min(theStride, aStart));
+    const std::size_t aAfter = n - aBefore - aInLine;
+    mDropped.resize(std::max<std::size_t>({aBefore, aAfter, 1}));
+    constexpr std::size_t CQORV_RECORDS_PER_CALL = 300;
+    std::vector<iovec> v;
+    for (std::size_t k0 = 0; k0 < theCount; k0 += CQORV_RECORDS_PER_CALL) {
+        const std::size_t m = std::min(CQORV_RECORDS_PER_CALL, theCount - k0);
+        v.clear();
+        for (std::size_t k = k0; k < k0 + m; ++k) {
+            if (aBefore > 0) v.push_back({mDropped.data(), aBefore});
+            v.push_back({theLines + k * theStride + aStart, aInLine});
+            if (aAfter > 0) v.push_back({mDropped.data(), aAfter});
+        }
+        uint64_t aOffset = mLayout.mFirstRecord + (theFirst + k0) * n;
+        std::size_t aLeft = m * n, i = 0;
+        while (aLeft > 0) {
+            const ssize_t r = ::preadv(mFd, v.data() + i, static_cast<int>(v.size() - i), static_cast<off_t>(aOffset));
+            if (r < 0 && errno == EINTR) continue;
+            if (r <= 0)
+                fqorvImportFail(CQORV_ERR_RASTER_READ, mLayout.mDataFile.string() + ": records " + std::to_string(theFirst + k0 + 1) +
+                                                           " to " + std::to_string(theFirst + k0 + m) + " can't be read" +
+                                                           (r < 0 ? std::string(": ") + std::strerror(errno) : std::string()));
+            aOffset += static_cast<uint64_t>(r);
+            aLeft -= static_cast<std::size_t>(r);
+            // A short read: skip the pieces filled, shorten the one begun.
+            for (std::size_t aDone = static_cast<std::size_t>(r); aDone > 0 && i < v.size();) {
+                const std::size_t t = std::min(aDone, v[i].iov_len);
+                v[i].iov_base = static_cast<uint8_t*>(v[i].iov_base) + t;
+                v[i].iov_len -= t;
+                aDone -= t;
+                if (v[i].iov_len == 0) ++i;
+            }
+        }
+    }
 }

@@ -19,8 +19,9 @@ namespace {
 
 namespace fs = std::filesystem;
 
-/// Lines assembled and written together (a few megabytes).
-constexpr std::size_t CQORV_WRITE_CHUNK_BYTES = 8u << 20;
+/// Lines assembled and written together: enough to make the system calls cheap, few enough that the
+/// buffer stays in memory the process has touched (new memory costs more than the copy here).
+constexpr std::size_t CQORV_WRITE_CHUNK_BYTES = 1u << 20;
 
 void putBE32(uint8_t* p, uint32_t v)
 {
@@ -39,44 +40,58 @@ void putBE16(uint8_t* p, uint16_t v)
 // ------------------------------------------------------------------------------------------------
 // The raster
 
-/// Reads the archive's records in runs and assembles the product's lines with rebuilt prefixes.
+/// Assembles a product's lines: the records read straight into their lines (the samples where
+/// the product wants them), the prefixes rebuilt, the lost lines filled.
 class CLineAssembler {
 public:
     CLineAssembler(const CNativeArchive& theArchive, CNativeRecordFile& theRecords)
         : mLayout(theArchive.mLayout), mRecords(theRecords),
           mLineBytes(static_cast<std::size_t>(CQORV_ERS_ROW_PREFIX) + 2u * static_cast<std::size_t>(mLayout.mSamples)),
-          // A record in the layout of the product (the CEOS products whose counter stands at 210)
+          mShift(static_cast<long>(CQORV_ERS_ROW_PREFIX) - static_cast<long>(mLayout.mSamplesPos)),
+          // A record in the product's own layout (the CEOS products whose counter stands at 210)
           // keeps its whole prefix; other layouts keep their auxiliary block only.
-          mSameLayout(mLayout.mSamplesPos == static_cast<uint32_t>(CQORV_ERS_ROW_PREFIX) &&
-                      mLayout.mCounterPos == CQORV_ERS_COUNTER_POS && mLayout.mRecordLength >= mLineBytes),
-          mChunkRecords(std::max<std::size_t>(1, CQORV_WRITE_CHUNK_BYTES / mLayout.mRecordLength)),
-          mInput(mChunkRecords * mLayout.mRecordLength)
+          mOwnLayout(mShift == 0 && mLayout.mCounterPos == CQORV_ERS_COUNTER_POS)
     {
     }
 
     std::size_t lineBytes() const { return mLineBytes; }
 
-    /// Writes line theLine into theOut (lineBytes()).
-    void assemble(const CPlannedLine& theLine, uint8_t* theOut)
+    /// Writes theCount lines from theLines into theOut (theCount lineBytes()).
+    void assemble(const CPlannedLine* theLines, std::size_t theCount, uint8_t* theOut)
     {
-        if (theLine.mSource < 0) {
-            fillLine(theOut);
-        } else {
-            const uint8_t* r = record(static_cast<uint64_t>(theLine.mSource));
-            if (mSameLayout) {
-                std::memcpy(theOut, r, mLineBytes);
+        for (std::size_t a = 0; a < theCount;) {
+            std::size_t b = a + 1;
+            if (theLines[a].mSource < 0) {
+                fillLine(theOut + a * mLineBytes);
             } else {
-                std::memset(theOut, 0, CQORV_ERS_ROW_PREFIX);
-                std::memcpy(theOut + CQORV_ERS_AUX_POS, r + mLayout.mAuxPos, CQORV_ERS_AUX_BYTES);
-                std::memcpy(theOut + CQORV_ERS_ROW_PREFIX, r + mLayout.mSamplesPos, mLineBytes - CQORV_ERS_ROW_PREFIX);
+                // A run of consecutive records in one read.
+                while (b < theCount && theLines[b].mSource == theLines[b - 1].mSource + 1) ++b;
+                mRecords.readIntoLines(static_cast<uint64_t>(theLines[a].mSource), b - a, theOut + a * mLineBytes, mLineBytes,
+                                       mShift);
+                if (!mOwnLayout)
+                    for (std::size_t i = a; i < b; ++i) rebuildPrefix(theOut + i * mLineBytes);
             }
+            a = b;
         }
-        putBE32(theOut + CQORV_ERS_COUNTER_POS, theLine.mCounter);
-        putBE16(theOut + CQORV_ERS_SWST_POS, theLine.mSwst);
-        putBE16(theOut + CQORV_ERS_PRI_POS, theLine.mPri);
+        for (std::size_t i = 0; i < theCount; ++i) {
+            uint8_t* p = theOut + i * mLineBytes;
+            putBE32(p + CQORV_ERS_COUNTER_POS, theLines[i].mCounter);
+            putBE16(p + CQORV_ERS_SWST_POS, theLines[i].mSwst);
+            putBE16(p + CQORV_ERS_PRI_POS, theLines[i].mPri);
+        }
     }
 
 private:
+    /// The prefix of a record of another layout: zeros, and its auxiliary block where the product
+    /// keeps it (the block stands inside the prefix in every layout, so it arrived in this line).
+    void rebuildPrefix(uint8_t* theLine) const
+    {
+        uint8_t aAux[CQORV_ERS_AUX_BYTES];
+        std::memcpy(aAux, theLine + mLayout.mAuxPos + mShift, CQORV_ERS_AUX_BYTES);
+        std::memset(theLine, 0, CQORV_ERS_ROW_PREFIX);
+        std::memcpy(theLine + CQORV_ERS_AUX_POS, aAux, CQORV_ERS_AUX_BYTES);
+    }
+
     /// A line the archive lost: the auxiliary block's marker and every sample at the I/Q bias
     /// (15 and 16 in turn, so that the chain's offset estimate stays at 15.5 and the line carries no
     /// signal after it).
@@ -90,24 +105,11 @@ private:
         }
     }
 
-    const uint8_t* record(uint64_t theRecord)
-    {
-        if (mCount == 0 || theRecord < mFirst || theRecord >= mFirst + mCount) {
-            mFirst = theRecord;
-            mCount = static_cast<std::size_t>(std::min<uint64_t>(mChunkRecords, mLayout.mRecords - theRecord));
-            mRecords.read(mFirst, mCount, mInput.data());
-        }
-        return mInput.data() + (theRecord - mFirst) * mLayout.mRecordLength;
-    }
-
     const CNativeRecordLayout& mLayout;
     CNativeRecordFile& mRecords;
     std::size_t mLineBytes;
-    bool mSameLayout;
-    std::size_t mChunkRecords;
-    std::vector<uint8_t> mInput;
-    uint64_t mFirst = 0;
-    std::size_t mCount = 0;
+    long mShift;      // where a record's byte 0 lands in its line
+    bool mOwnLayout;
 };
 
 /// A file being written under a temporary name; removed unless committed.
@@ -171,7 +173,7 @@ void writeRaster(const CNativeArchive& a, CNativeRecordFile& theRecords, const C
     int aPercent = -1;
     for (std::size_t aFirst = 0; aFirst < n; aFirst += aChunkLines) {
         const std::size_t aCount = std::min(aChunkLines, n - aFirst);
-        for (std::size_t i = 0; i < aCount; ++i) aAssembler.assemble(p.mLines[aFirst + i], aOut.data() + i * aLineBytes);
+        aAssembler.assemble(p.mLines.data() + aFirst, aCount, aOut.data());
         aPart.write(aOut.data(), aCount * aLineBytes);
         const int aNow = static_cast<int>(100 * (aFirst + aCount) / n);
         if (theProgress && aNow != aPercent) theProgress(aNow);
