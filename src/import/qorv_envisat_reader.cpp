@@ -234,6 +234,5 @@ CNativeArchive fqorvReadErsEnvisat(const std::filesystem::path& theFile)
     }
     readPacketLayout(findPacketDescriptor(aHeaders, aMph, aName), aArchive);
     aArchive.mNotes.push_back("one state vector from the main product header (" + aMph.text("VECTOR_SOURCE") + ")");
-    aArchive.mNotes.push_back("the product states no radar values: the ERS constants serve");
     return aArchive;
 }

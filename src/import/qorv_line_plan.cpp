@@ -95,7 +95,7 @@ struct CDraft {
     CPlannedProduct mProduct;
     int64_t mFirstCounter = 0;   // unwrapped counter of the first line (written as 1)
     int64_t mTopCounter = 0;     // the highest so far: the chain measures each record from it
-    CTally mFills, mRepeats, mPriGarbage;
+    CTally mFills, mGaps, mRepeats, mPriGarbage;
 };
 
 /// The code most records with their marker carry (the smallest of equals), for a failure's words.
@@ -284,6 +284,8 @@ std::vector<CDraft> fWalkRecords(const CCodes& theCodes, const std::vector<int64
             d.mFills.add([&] { return fqorvStringFormat("%lld before record %lld", fLL(aStep - 1), fLL(i)); },
                          aStep - 1);
             for (int64_t k = 1; k < aStep; ++k) aLine(d, -1, d.mTopCounter + k);
+        } else if (aStep > 1) {
+            d.mGaps.add([&] { return fqorvStringFormat("%lld before record %lld", fLL(aStep - 1), fLL(i)); }, aStep - 1);
         }
         if (aStep <= 0) d.mRepeats.addRecord(i);
         aLine(d, i, theCounter[i]);
@@ -562,6 +564,12 @@ CLinePlan fqorvPlanLines(const std::vector<CRecordCodes>& theCodes, const CNativ
                                                fLL(d.mFills.amount()), fCount(d.mFills.count(), "gap", "gaps").c_str(),
                                                CQORV_CHAIN_GAP_LIMIT) +
                              d.mFills.list());
+        if (!d.mGaps.empty())
+            aNotes.push_back(fqorvStringFormat("%lld lines lost in %s of up to %d lines in the line counter, left for focusing "
+                                               "to fill: ",
+                                               fLL(d.mGaps.amount()), fCount(d.mGaps.count(), "gap", "gaps").c_str(),
+                                               CQORV_CHAIN_GAP_LIMIT) +
+                             d.mGaps.list());
         if (!d.mRepeats.empty())
             aNotes.push_back(fCount(d.mRepeats.count(), "record repeats or overlaps", "records repeat or overlap") +
                              " earlier lines (" + d.mRepeats.records() +

@@ -29,16 +29,15 @@ std::string format(const char* theFormat, double a, double b = 0.0, double c = 0
     return s;
 }
 
-/// A stated value when it is finite, the format's constant (with a note) when the archive states
-/// none; either way it must lie in [theMin, theMax].
+/// A stated value when it is finite, the format's constant (named in theDefaults) when the archive
+/// states none; either way it must lie in [theMin, theMax].
 double statedOr(double theStated, double theConstant, double theMin, double theMax, const char* theWhat,
-                const char* theUnit, double theScale, CProductDescription& d)
+                const char* theUnit, double theScale, std::vector<std::string>& theDefaults)
 {
     double v = theStated;
     if (!std::isfinite(v)) {
         v = theConstant;
-        d.mNotes.push_back(std::string(theWhat) + ": the archive states none, the ERS value " +
-                           format("%.10g", v * theScale) + " " + theUnit + " is used");
+        theDefaults.push_back(std::string(theWhat) + " " + format("%.10g", v * theScale) + " " + theUnit);
     }
     if (!(std::fabs(v) >= theMin && std::fabs(v) <= theMax))
         fqorvImportFail(CQORV_ERR_IMPORT_VALUE, std::string(theWhat) + " " + format("%.10g", v * theScale) + " " + theUnit +
@@ -52,11 +51,17 @@ double statedOr(double theStated, double theConstant, double theMin, double theM
 void describeRadar(const CNativeArchive& a, const CPlannedProduct& p, CProductDescription& d)
 {
     const double c = CQORV_LIGHT_SPEED;
-    const double aWavelength = statedOr(a.mWavelength, c / NQORV_ERS::CARRIER, 0.015, 0.3, "wavelength", "m", 1.0, d);
+    std::vector<std::string> aDefaults;
+    const double aWavelength = statedOr(a.mWavelength, c / NQORV_ERS::CARRIER, 0.015, 0.3, "wavelength", "m", 1.0, aDefaults);
     d.mCarrier = c / aWavelength;
-    d.mSamplingRate = statedOr(a.mSamplingRate, NQORV_ERS::SAMPLING_RATE, 1e6, 1e9, "sampling rate", "MHz", 1e-6, d);
-    d.mChirpRate = statedOr(a.mChirpRate, NQORV_ERS::CHIRP_RATE, 1e9, 1e15, "chirp rate", "Hz/s", 1.0, d);
-    d.mPulseLength = statedOr(a.mPulseLength, NQORV_ERS::PULSE_LENGTH, 1e-7, 1e-3, "pulse length", "us", 1e6, d);
+    d.mSamplingRate = statedOr(a.mSamplingRate, NQORV_ERS::SAMPLING_RATE, 1e6, 1e9, "sampling rate", "MHz", 1e-6, aDefaults);
+    d.mChirpRate = statedOr(a.mChirpRate, NQORV_ERS::CHIRP_RATE, 1e9, 1e15, "chirp rate", "Hz/s", 1.0, aDefaults);
+    d.mPulseLength = statedOr(a.mPulseLength, NQORV_ERS::PULSE_LENGTH, 1e-7, 1e-3, "pulse length", "us", 1e6, aDefaults);
+    if (!aDefaults.empty()) {
+        std::string aList;
+        for (const std::string& x : aDefaults) aList += (aList.empty() ? "" : ", ") + x;
+        d.mNotes.push_back("the ERS image mode's values where the archive states none: " + aList);
+    }
     d.mBandwidth = std::fabs(d.mChirpRate) * d.mPulseLength;
     if (d.mBandwidth > d.mSamplingRate)
         fqorvImportFail(CQORV_ERR_IMPORT_VALUE, format("chirp bandwidth %.6g MHz above the sampling rate %.6g MHz",
