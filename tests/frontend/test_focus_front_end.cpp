@@ -107,29 +107,32 @@ TEST(FocusFrontEnd, AFailingSceneLeavesTheOthersAndTheTerminalSeesOneLinePerScen
     fs::copy_file(aDir / "in" / "good_raw", aDir / "in" / "lonely_raw");  // no header
     fs::copy_file(aDir / "in" / "good_raw", aDir / "in" / "broken_raw");
     qtest::writeFile(aDir / "in" / "broken_raw.sml", "<?xml version=\"1.0\"?>\n<Nothing>\n");
+    qtest::writeFile(aDir / "in" / "notes.txt", "neither a raw product nor an archive\n");
     const std::string aCommand = kFocus.string() + " --out " + shellQuote((aDir / "out").string()) +
                                  " --jobs 2 --skip 1 --skip 3 --no-ambiguity --no-tiff --json " +
                                  shellQuote((aDir / "summary.json").string()) + " " +
                                  shellQuote((aDir / "in" / "lonely_raw").string()) + " " +
                                  shellQuote((aDir / "in" / "broken_raw").string()) + " " +
+                                 shellQuote((aDir / "in" / "notes.txt").string()) + " " +
                                  shellQuote((aDir / "in" / "good_raw").string());
     // A pseudo-terminal: progress is redrawn in place.
     const qtest::RunResult r = qtest::runProgram("/usr/bin/script", {"-qec", aCommand, "/dev/null"}, {}, aDir.path(), 300);
     EXPECT_EQ(r.mStatus, 1) << r.mStdout;
     EXPECT_NE(r.mStdout.find("\033[2K"), std::string::npos);
-    EXPECT_NE(r.mStdout.find("\033[3A"), std::string::npos);
+    EXPECT_NE(r.mStdout.find("\033[4A"), std::string::npos);
 
     const CJson aSummary = CJson::parseFile((aDir / "summary.json").string());
     EXPECT_FALSE(aSummary["all_succeeded"].boolean());
     const CJson& aScenes = aSummary["scenes"];
-    ASSERT_EQ(aScenes.size(), 3u);
+    ASSERT_EQ(aScenes.size(), 4u);
     EXPECT_EQ(aScenes[std::size_t{0}]["state"].string(), "FAILED");
     EXPECT_EQ(aScenes[std::size_t{0}]["failure_id"].number(), 261122);
     EXPECT_NE(aScenes[std::size_t{0}]["failure_text"].string().find("no header"), std::string::npos);
     EXPECT_EQ(aScenes[std::size_t{1}]["state"].string(), "FAILED");
     EXPECT_GT(aScenes[std::size_t{1}]["failure_id"].number(), 0);
     EXPECT_FALSE(aScenes[std::size_t{1}]["failure_text"].string().empty());
-    EXPECT_EQ(aScenes[std::size_t{2}]["state"].string(), "done");
+    EXPECT_EQ(aScenes[std::size_t{2}]["failure_id"].number(), 979201);
+    EXPECT_EQ(aScenes[std::size_t{3}]["state"].string(), "done");
     EXPECT_TRUE(fs::exists(aDir / "out" / "good_slc"));
     EXPECT_FALSE(fs::exists(aDir / "out" / "broken_slc"));
 }
@@ -174,12 +177,19 @@ TEST(FocusFrontEnd, CtrlCStopsTheRunThroughTheWorkingFileAndLeavesNoProduct)
     EXPECT_NE(aProgress.find("failure 326400: ended at once by a second interrupt"), std::string::npos) << aProgress;
 }
 
-TEST(FocusFrontEnd, TheWorkflowFocusesEveryRawProductOfADirectory)
+TEST(FocusFrontEnd, TheWorkflowFocusesEveryRawProductAndArchiveOfADirectory)
 {
     if (std::system("snakemake --version > /dev/null 2>&1") != 0) GTEST_SKIP() << "snakemake is not installed";
     qtest::TempDir aDir;
     simulate(aDir / "raw", "first");
     simulate(aDir / "raw", "second");
+    // An ERS CEOS archive beside them: a scene named by its directory, its products by the import.
+    const qtest::RunResult aArchive = qtest::runProgram(
+        qtest::binaryDir() / "qorvex_simulate",
+        {"--preset", "ers2", "--format", "ceos", "--lines", "1024", "--samples", "1024", "--targets", "grid:1x2", "--quiet",
+         "--out", (aDir / "raw" / "archive").string(), "--config", (qtest::binaryDir().parent_path() / "etc").string()},
+        {}, aDir.path());
+    ASSERT_EQ(aArchive.mStatus, 0) << aArchive.mStderr;
     const qtest::RunResult r = qtest::runProgram(
         "/usr/bin/env",
         {"snakemake", "-s", (qtest::sourceShareDir().parent_path().parent_path() / "workflow" / "Snakefile").string(),
@@ -193,6 +203,11 @@ TEST(FocusFrontEnd, TheWorkflowFocusesEveryRawProductOfADirectory)
         EXPECT_TRUE(fs::exists(d / (std::string(aScene) + "_slc"))) << aScene;
         EXPECT_TRUE(CJson::parseFile((d / (std::string(aScene) + "_summary.json")).string())["all_succeeded"].boolean());
     }
+    const CJson aSummary = CJson::parseFile((aDir / "focused" / "archive" / "archive_summary.json").string());
+    EXPECT_TRUE(aSummary["all_succeeded"].boolean());
+    const std::string aName = aSummary["scenes"][std::size_t{0}]["name"].string();
+    EXPECT_EQ(aName.rfind("ERS2_", 0), 0u) << aName;
+    EXPECT_TRUE(fs::exists(aDir / "focused" / "archive" / (aName + "_slc")));
 }
 
 }  // namespace
