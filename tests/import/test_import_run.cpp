@@ -120,6 +120,9 @@ TEST(ImportRun, BrokenInputsFailWithTheirIdsAndLeaveNoProduct)
         simulateArchive(aBox, aBox.data() / "archive", "ceos", {"--lines", "1024", "--samples", "1024", "--targets", "grid:1x1", "--no-noise"});
     const fs::path aOut = aBox.data() / "out";
     qtest::writeFile(aBox.data() / "notes.txt", "not an archive\n");
+    std::string aFarOrbit;  // four vectors of another day
+    for (int k = 0; k < 4; ++k) aFarOrbit += "1996-01-01T00:00:" + std::to_string(10 + 10 * k) + " 7000000 0 0 0 7500 0\n";
+    qtest::writeFile(aBox.data() / "far_orbit.txt", aFarOrbit);
     struct Case {
         std::vector<std::string> mArgs;
         int mStatus;
@@ -127,6 +130,7 @@ TEST(ImportRun, BrokenInputsFailWithTheirIdsAndLeaveNoProduct)
     };
     for (const Case& c : {Case{{"--aux", "x", aArchive.string()}, 15, "failure 979208"},
                           Case{{"--lines", "5000:10", aArchive.string()}, 15, "failure 979208"},
+                          Case{{"--orbit", (aBox.data() / "far_orbit.txt").string(), aArchive.string()}, 15, "failure 979207"},
                           Case{{(aBox.data() / "notes.txt").string()}, 15, "failure 979201"},
                           Case{{(aBox.data() / "missing").string()}, 4, "failure 261122"},
                           Case{{"--lines", "7", aArchive.string()}, 2, "--lines wants FIRST:COUNT"}}) {
