@@ -186,8 +186,15 @@ CJson inputJson(const fs::path& theInput, const CImportReport* r, int theFailure
 
 void printReport(const CImportReport& r)
 {
-    std::printf("%s: %s (%s%s%s), %s, %llu lines of %d samples\n", r.mSource.c_str(), r.mFormat.c_str(), r.mLayout.c_str(),
-                r.mFacility.empty() ? "" : ", ", (r.mFacility + (r.mProcessor.empty() ? "" : " " + r.mProcessor)).c_str(),
+    // The format, its layout where the format has several, the facility and processor.
+    std::vector<std::string> aWhat;
+    if (r.mFormat.size() < r.mLayout.size() || r.mFormat.compare(r.mFormat.size() - r.mLayout.size(), r.mLayout.size(), r.mLayout) != 0)
+        aWhat.push_back(r.mLayout);
+    if (!r.mFacility.empty()) aWhat.push_back(r.mFacility + (r.mProcessor.empty() ? "" : " " + r.mProcessor));
+    std::string aDetail;
+    for (const std::string& x : aWhat) aDetail += (aDetail.empty() ? " (" : ", ") + x;
+    if (!aDetail.empty()) aDetail += ")";
+    std::printf("%s: %s%s, %s, %llu lines of %d samples\n", r.mSource.c_str(), r.mFormat.c_str(), aDetail.c_str(),
                 r.mSensor.c_str(), static_cast<unsigned long long>(r.mRecords), r.mSamples);
     for (const std::string& n : r.mNotes) std::printf("  note: %s\n", n.c_str());
     for (const CImportedProduct& p : r.mProducts) {
