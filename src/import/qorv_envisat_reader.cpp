@@ -69,8 +69,10 @@ public:
     int64_t integer(const std::string& theKey) const
     {
         const double aValue = number(theKey);
-        if (aValue != std::floor(aValue))
-            fqorvImportFail(CQORV_ERR_IMPORT_VALUE, mName + ": " + theKey + " '" + text(theKey) + "' is not an integer");
+        // Beyond 2^53 a double no longer holds every integer, and beyond 2^63 the conversion is
+        // undefined: no count, size or offset of a product comes near either.
+        if (aValue != std::floor(aValue) || std::fabs(aValue) > 9007199254740992.0)
+            fqorvImportFail(CQORV_ERR_IMPORT_VALUE, mName + ": " + theKey + " '" + text(theKey) + "' is not an integer up to 2^53");
         return static_cast<int64_t>(aValue);
     }
 

@@ -3,6 +3,7 @@
 // ENVISAT-format product, and the archives each refusal is for.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <array>
 #include <cmath>
 #include <cstdio>
@@ -40,6 +41,12 @@ void putU16(Bytes& theBytes, std::size_t thePos, uint16_t theValue)
 {
     theBytes[thePos] = static_cast<uint8_t>(theValue >> 8);
     theBytes[thePos + 1] = static_cast<uint8_t>(theValue);
+}
+void replaceText(Bytes& theBytes, const std::string& theOld, const std::string& theNew)
+{
+    const auto aAt = std::search(theBytes.begin(), theBytes.end(), theOld.begin(), theOld.end());
+    ASSERT_NE(aAt, theBytes.end()) << theOld;
+    std::copy(theNew.begin(), theNew.end(), aAt);
 }
 void append(Bytes& theTo, const Bytes& theFrom) { theTo.insert(theTo.end(), theFrom.begin(), theFrom.end()); }
 void writeBytes(const fs::path& thePath, const Bytes& theBytes)
@@ -413,6 +420,8 @@ TEST(EnvisatReader, ErsProductReadsBackAndItsTrapsAreRefused)
          "ENVISAT ASAR level 0 is not imported yet"},
         {"ISP length", [](Bytes& b) { putU16(b, 3203 + 24, 11400); }, 979203, "states a length of 11433"},
         {"truncated", [](Bytes& b) { b.resize(3203 + 11498 * 2 + 100); }, 0, ""},
+        {"offset beyond 64 bits", [](Bytes& b) { replaceText(b, "+00000000000000003203", "+20000000000000003203"); }, 979210,
+         "DS_OFFSET '+20000000000000003203' is not an integer"},
     };
     for (const CCase& aCase : aCases) {
         SCOPED_TRACE(aCase.mName);
