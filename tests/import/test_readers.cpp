@@ -422,6 +422,13 @@ TEST(EnvisatReader, ErsProductReadsBackAndItsTrapsAreRefused)
         {"truncated", [](Bytes& b) { b.resize(3203 + 11498 * 2 + 100); }, 0, ""},
         {"offset beyond 64 bits", [](Bytes& b) { replaceText(b, "+00000000000000003203", "+20000000000000003203"); }, 979210,
          "DS_OFFSET '+20000000000000003203' is not an integer"},
+        {"descriptor counts beyond 64 bits", [](Bytes& b) {
+             replaceText(b, "NUM_DSD=+0000000004", "NUM_DSD=+9999999999");
+             replaceText(b, "DSD_SIZE=+0000000280", "DSD_SIZE=+9999999999");
+         }, 979210, "9999999999 data set descriptors of 9999999999 bytes do not fit"},
+        {"record count beyond 64 bits", [](Bytes& b) {
+             replaceText(b, "NUM_DSR=+4\nDSR_SIZE=+0000011498<bytes>\n", "NUM_DSR=+1000000000000000\nDSR_SIZE=+0000011498<bytes>\n");
+         }, 979203, "of 45992 bytes hold not 1000000000000000"},
     };
     for (const CCase& aCase : aCases) {
         SCOPED_TRACE(aCase.mName);
