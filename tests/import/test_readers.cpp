@@ -331,6 +331,8 @@ TEST(ErsCeosReader, RefusalsNameWhatIsWrong)
          "ALOS PALSAR level 1.0 is not imported yet"},
         {"leader record cut", leader, [](Bytes& b) { putU32(b, PPR + 8, 5); }, "a", 979203, "record 4 at byte 4226 states a length of 5"},
         {"descriptor sums", data, [](Bytes& b) { putNumber(b, 248, 8, "5600"); }, "b", 979203, "make 11612"},
+        {"lines beyond the records", data, [](Bytes& b) { putNumber(b, 248, 8, "6115"), putNumber(b, 288, 4, "-998"); }, "b",
+         979203, "6115 samples per line and a suffix of -998 bytes"},
         {"first record's length", data, [](Bytes& b) { putU32(b, 11644 + 8, 11600); }, "b", 979203,
          "record 1 at byte 11644 states a length of 11600"},
         {"unknown layout", data, [](Bytes& b) { putNumber(b, 276, 4, "408"), putNumber(b, 248, 8, "5612"); }, "b", 979204,
