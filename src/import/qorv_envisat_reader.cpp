@@ -69,8 +69,10 @@ public:
     int64_t integer(const std::string& theKey) const
     {
         const double aValue = number(theKey);
-        if (aValue != std::floor(aValue))
-            fqorvImportFail(CQORV_ERR_IMPORT_VALUE, mName + ": " + theKey + " '" + text(theKey) + "' is not an integer");
+        // Beyond 2^53 a double no longer holds every integer, and beyond 2^63 the conversion is
+        // undefined: no count, size or offset of a product comes near either.
+        if (aValue != std::floor(aValue) || std::fabs(aValue) > 9007199254740992.0)
+            fqorvImportFail(CQORV_ERR_IMPORT_VALUE, mName + ": " + theKey + " '" + text(theKey) + "' is not an integer up to 2^53");
         return static_cast<int64_t>(aValue);
     }
 
@@ -161,11 +163,12 @@ CKeyValues findPacketDescriptor(const std::vector<uint8_t>& theHeaders, const CK
     const int64_t aSphSize = theMph.integer("SPH_SIZE");
     const int64_t aCount = theMph.integer("NUM_DSD");
     const int64_t aSize = theMph.integer("DSD_SIZE");
-    const int64_t aFirst = static_cast<int64_t>(CQORV_MPH_BYTES) + aSphSize - aCount * aSize;
-    if (aCount < 1 || aSize < 1 || aFirst < static_cast<int64_t>(CQORV_MPH_BYTES))
+    // Each count on its own within the header before their product, which could overflow.
+    if (aCount < 1 || aSize < 1 || aCount > aSphSize || aSize > aSphSize || aCount * aSize > aSphSize)
         fqorvImportFail(CQORV_ERR_IMPORT_VALUE, theFile + ": " + std::to_string(aCount) + " data set descriptors of " +
                                                     std::to_string(aSize) + " bytes do not fit a specific product header of " +
                                                     std::to_string(aSphSize));
+    const int64_t aFirst = static_cast<int64_t>(CQORV_MPH_BYTES) + aSphSize - aCount * aSize;
     for (int64_t i = 0; i < aCount; ++i) {
         const std::size_t aBegin = static_cast<std::size_t>(aFirst + i * aSize);
         const CKeyValues aDsd(theHeaders, aBegin, aBegin + static_cast<std::size_t>(aSize),
@@ -185,7 +188,9 @@ void readPacketLayout(const CKeyValues& theDsd, CNativeArchive& theArchive)
     if (aDsrSize != CQORV_ERS_DSR_BYTES)
         fqorvImportFail(CQORV_ERR_IMPORT_LAYOUT, aName + ": SAR_SOURCE_PACKETS of " + aLengths + ", the ERS layout has " +
                                                      std::to_string(CQORV_ERS_DSR_BYTES));
-    if (theDsd.has("DS_SIZE") && theDsd.integer("DS_SIZE") != aCount * aDsrSize)
+    // Divided rather than multiplied: a record count of a broken header overflows the product.
+    if (theDsd.has("DS_SIZE") &&
+        (theDsd.integer("DS_SIZE") % aDsrSize != 0 || theDsd.integer("DS_SIZE") / aDsrSize != aCount))
         fqorvImportFail(CQORV_ERR_IMPORT_RECORD_LENGTH, aName + ": SAR_SOURCE_PACKETS of " +
                                                             std::to_string(theDsd.integer("DS_SIZE")) + " bytes hold not " +
                                                             std::to_string(aCount) + " " + aLengths);

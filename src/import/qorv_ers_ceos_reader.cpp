@@ -208,6 +208,11 @@ void readDataFile(const std::filesystem::path& theData, CNativeArchive& theArchi
     // The stated prefix leaves out the record's 12-byte header.
     const int64_t aRowPrefix = requiredInteger(aFdr, 276, 4, "prefix length") + CQORV_CEOS_HEADER_BYTES;
     const int64_t aSuffix = aFdr.integer(288, 4).value_or(0);
+    // A negative suffix would balance the sum below with lines longer than their records.
+    if (aSuffix < 0)
+        fqorvImportFail(CQORV_ERR_IMPORT_RECORD_LENGTH, aName + ": the descriptor states " + std::to_string(aSamples) +
+                                                            " samples per line and a suffix of " + std::to_string(aSuffix) +
+                                                            " bytes");
     if (aRecordLength != aRowPrefix + 2 * aSamples + aSuffix)
         fqorvImportFail(CQORV_ERR_IMPORT_RECORD_LENGTH,
                         aName + ": the descriptor states records of " + std::to_string(aRecordLength) + " bytes, but a prefix of " +

@@ -2,14 +2,15 @@
 # Builds the libFuzzer harnesses with clang (AddressSanitizer and UndefinedBehaviorSanitizer) into
 # build-fuzz/ and runs each for a given time on a corpus seeded from the project's own files.
 # Usage: tests/fuzz/run_fuzzers.sh SECONDS [harness ...]   (harnesses: xml_header text_header
-#        key_file arguments json; all when none is named). Exit status 1 when a harness found a crash.
+#        key_file arguments json native_archive; all when none is named). Exit status 1 when a
+#        harness found a crash.
 # Environment: QORVEX_FUZZ_JOBS (default 1) parallel jobs per harness; QORVEX_FUZZ_NICE (default 19).
 set -euo pipefail
 top=$(cd "$(dirname "$0")/../.." && pwd)
 seconds=${1:?usage: run_fuzzers.sh SECONDS [harness ...]}
 shift
 harnesses=("$@")
-[ ${#harnesses[@]} -gt 0 ] || harnesses=(xml_header text_header key_file arguments json)
+[ ${#harnesses[@]} -gt 0 ] || harnesses=(xml_header text_header key_file arguments json native_archive)
 build="$top/build-fuzz"
 jobs=${QORVEX_FUZZ_JOBS:-1}
 
@@ -28,7 +29,8 @@ targets=()
 for h in "${harnesses[@]}"; do targets+=("fuzz_$h"); done
 cmake --build "$build" -j "$(nproc)" --target "${targets[@]}"
 
-# Seeds: the project's own headers, key and mandatory files, arguments and JSON examples.
+# Seeds: the project's own headers, key and mandatory files, arguments and JSON examples;
+# native_archive writes its own (simulated archives) into the corpus at start-up.
 seeds() {
   case "$1" in
     xml_header) ls "$top"/tests/store/golden/*.sml "$top"/tests/fuzz/seeds/xml_header/* ;;
@@ -47,13 +49,15 @@ for h in "${harnesses[@]}"; do
   for f in $(seeds "$h"); do cp -n "$f" "$corpus/" 2>/dev/null || true; done
   dict=()
   [ "$h" = xml_header ] && dict=(-dict="$top/tests/fuzz/xml.dict")
+  seed_env=()
+  [ "$h" = native_archive ] && seed_env=(QORVEX_FUZZ_SEEDS="$corpus")
   log="$build/fuzz_$h.log"
   before=$(ls "$artifacts" | wc -l)
   echo "fuzz: $h for ${seconds} s (log $log)"
   parallel=()
   [ "$jobs" -gt 1 ] && parallel=(-jobs="$jobs" -workers="$jobs")
   set +e
-  (cd "$build" && nice -n "${QORVEX_FUZZ_NICE:-19}" "$build/fuzz/fuzz_$h" "$corpus" "${dict[@]}" "${parallel[@]}" \
+  (cd "$build" && env "${seed_env[@]}" nice -n "${QORVEX_FUZZ_NICE:-19}" "$build/fuzz/fuzz_$h" "$corpus" "${dict[@]}" "${parallel[@]}" \
     -max_total_time="$seconds" -timeout=10 -rss_limit_mb=2048 -malloc_limit_mb=1024 -max_len=65536 \
     -print_final_stats=1 -artifact_prefix="$artifacts") > "$log" 2>&1
   rc=$?

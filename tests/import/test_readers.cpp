@@ -3,6 +3,7 @@
 // ENVISAT-format product, and the archives each refusal is for.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <array>
 #include <cmath>
 #include <cstdio>
@@ -40,6 +41,12 @@ void putU16(Bytes& theBytes, std::size_t thePos, uint16_t theValue)
 {
     theBytes[thePos] = static_cast<uint8_t>(theValue >> 8);
     theBytes[thePos + 1] = static_cast<uint8_t>(theValue);
+}
+void replaceText(Bytes& theBytes, const std::string& theOld, const std::string& theNew)
+{
+    const auto aAt = std::search(theBytes.begin(), theBytes.end(), theOld.begin(), theOld.end());
+    ASSERT_NE(aAt, theBytes.end()) << theOld;
+    std::copy(theNew.begin(), theNew.end(), aAt);
 }
 void append(Bytes& theTo, const Bytes& theFrom) { theTo.insert(theTo.end(), theFrom.begin(), theFrom.end()); }
 void writeBytes(const fs::path& thePath, const Bytes& theBytes)
@@ -324,6 +331,8 @@ TEST(ErsCeosReader, RefusalsNameWhatIsWrong)
          "ALOS PALSAR level 1.0 is not imported yet"},
         {"leader record cut", leader, [](Bytes& b) { putU32(b, PPR + 8, 5); }, "a", 979203, "record 4 at byte 4226 states a length of 5"},
         {"descriptor sums", data, [](Bytes& b) { putNumber(b, 248, 8, "5600"); }, "b", 979203, "make 11612"},
+        {"lines beyond the records", data, [](Bytes& b) { putNumber(b, 248, 8, "6115"), putNumber(b, 288, 4, "-998"); }, "b",
+         979203, "6115 samples per line and a suffix of -998 bytes"},
         {"first record's length", data, [](Bytes& b) { putU32(b, 11644 + 8, 11600); }, "b", 979203,
          "record 1 at byte 11644 states a length of 11600"},
         {"unknown layout", data, [](Bytes& b) { putNumber(b, 276, 4, "408"), putNumber(b, 248, 8, "5612"); }, "b", 979204,
@@ -413,6 +422,15 @@ TEST(EnvisatReader, ErsProductReadsBackAndItsTrapsAreRefused)
          "ENVISAT ASAR level 0 is not imported yet"},
         {"ISP length", [](Bytes& b) { putU16(b, 3203 + 24, 11400); }, 979203, "states a length of 11433"},
         {"truncated", [](Bytes& b) { b.resize(3203 + 11498 * 2 + 100); }, 0, ""},
+        {"offset beyond 64 bits", [](Bytes& b) { replaceText(b, "+00000000000000003203", "+20000000000000003203"); }, 979210,
+         "DS_OFFSET '+20000000000000003203' is not an integer"},
+        {"descriptor counts beyond 64 bits", [](Bytes& b) {
+             replaceText(b, "NUM_DSD=+0000000004", "NUM_DSD=+9999999999");
+             replaceText(b, "DSD_SIZE=+0000000280", "DSD_SIZE=+9999999999");
+         }, 979210, "9999999999 data set descriptors of 9999999999 bytes do not fit"},
+        {"record count beyond 64 bits", [](Bytes& b) {
+             replaceText(b, "NUM_DSR=+4\nDSR_SIZE=+0000011498<bytes>\n", "NUM_DSR=+1000000000000000\nDSR_SIZE=+0000011498<bytes>\n");
+         }, 979203, "of 45992 bytes hold not 1000000000000000"},
     };
     for (const CCase& aCase : aCases) {
         SCOPED_TRACE(aCase.mName);
