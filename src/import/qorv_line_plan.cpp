@@ -456,7 +456,7 @@ CClockFit fFitClock(const CDraft& theDraft, const CCodes& theCodes, const std::v
 
 /// 979206 when more than one clock reading in CQORV_CLOCK_OFF_RATIO lies off the others: the clock
 /// goes backwards somewhere, at the first record whose reading falls below the one before it.
-void fCheckClockOrder(const std::vector<CClockFit>& theFits, const CCodes& theCodes)
+void fCheckClockOrder(const std::vector<CClockFit>& theFits, const CCodes& theCodes, const CNativeClock& theClock)
 {
     int64_t aReadings = 0, aOff = 0;
     for (const CClockFit& f : theFits) {
@@ -467,15 +467,15 @@ void fCheckClockOrder(const std::vector<CClockFit>& theFits, const CCodes& theCo
     int64_t aBefore = -1, aFalls = -1;
     for (int64_t i = 0; i < static_cast<int64_t>(theCodes.size()); ++i) {
         if (!theCodes[i].mMarker) continue;
-        if (aBefore >= 0 && static_cast<int32_t>(theCodes[i].mClock - theCodes[aBefore].mClock) < 0) {
+        if (aBefore >= 0 && theClock.timeOf(theCodes[i].mClock) < theClock.timeOf(theCodes[aBefore].mClock)) {
             aFalls = i;
             break;
         }
         aBefore = i;
     }
     const std::string aWhere =
-        aFalls >= 0 ? fqorvStringFormat("record %lld: the on-board clock falls from %u to %u ticks", fLL(aFalls),
-                                        theCodes[aBefore].mClock, theCodes[aFalls].mClock)
+        aFalls >= 0 ? fqorvStringFormat("record %lld: the on-board clock falls from %lld to %lld ticks", fLL(aFalls),
+                                        fLL(theCodes[aBefore].mClock), fLL(theCodes[aFalls].mClock))
                     : std::string("the on-board clock runs off the line counter");
     fqorvImportFail(CQORV_ERR_IMPORT_TIME_ORDER,
                     aWhere + fqorvStringFormat("; %lld of %lld readings lie off the others", fLL(aOff), fLL(aReadings)));
@@ -553,7 +553,7 @@ CLinePlan fqorvPlanLines(const std::vector<CRecordCodes>& theCodes, const CNativ
 
     std::vector<CClockFit> aFits;
     for (const CDraft& d : aDrafts) aFits.push_back(fFitClock(d, theCodes, aCounter, theArchive.mClock));
-    fCheckClockOrder(aFits, theCodes);
+    fCheckClockOrder(aFits, theCodes, theArchive.mClock);
     fTimeProducts(aDrafts, aFits, theArchive, n, aPlan);
 
     for (CDraft& d : aDrafts) {

@@ -5,10 +5,12 @@
 #include <cstddef>
 #include <cstdint>
 #include <filesystem>
+#include <functional>
 #include <string>
 #include <vector>
 
 #include "qorv_native_archive.h"
+#include "qorv_native_reader.h"
 
 /// Reads up to theCount bytes of theFile from theOffset (fewer at its end). 261122 when the file
 /// can't be opened, 261125 on a read failure.
@@ -64,3 +66,18 @@ CNativeArchive fqorvReadErsCeos(const std::filesystem::path& theLeader, const st
 
 /// ERS level 0 in the ENVISAT format; ENVISAT ASAR and other products are refused (979201).
 CNativeArchive fqorvReadErsEnvisat(const std::filesystem::path& theFile);
+
+/// ENVISAT ASAR image mode level 0 (qorv_asar_reader.cpp): the product's headers, its instrument
+/// file (given, or found beside the product), the first echo packet's codes.
+CNativeArchive fqorvReadAsarEnvisat(const std::filesystem::path& theFile, const CNativeOutsideFiles& theOutside);
+
+/// ALOS PALSAR level 1.0 (qorv_alos_reader.cpp): the leader and one image file.
+CNativeArchive fqorvReadAlosCeos(const std::filesystem::path& theLeader, const std::filesystem::path& theImage);
+
+/// The codes of every packet of an ASAR data set, walked by each packet's own length (qorv_asar_reader.cpp).
+std::vector<CRecordCodes> fqorvScanAsarPackets(int theFd, const CNativeRecordLayout& theLayout,
+                                               const std::function<void(int)>& theProgress);
+
+/// The codes of every record of an ALOS image file (qorv_alos_reader.cpp).
+std::vector<CRecordCodes> fqorvScanAlosRecords(int theFd, const CNativeRecordLayout& theLayout,
+                                               const std::function<void(int)>& theProgress);

@@ -350,7 +350,7 @@ fs::path directoryOf(const fs::path& theFile)
 
 }  // namespace
 
-CNativeArchive fqorvReadNativeArchive(const fs::path& theInput)
+CNativeArchive fqorvReadNativeArchive(const fs::path& theInput, const CNativeOutsideFiles& theOutside)
 {
     std::error_code aError;
     if (!fs::exists(theInput, aError)) fqorvImportFail(CQORV_ERR_MISSING_FILE, theInput.string() + " does not exist");
@@ -362,6 +362,7 @@ CNativeArchive fqorvReadNativeArchive(const fs::path& theInput)
         switch (aClass.mKind) {
         case ENativeFileKind::Envisat:
             aArchive = fqorvReadErsEnvisat(theInput);
+            (void)theOutside;
             break;
         case ENativeFileKind::CeosLeader: {
             refuseOtherMission(aClass, theInput);
@@ -398,6 +399,8 @@ CNativeRecordFile::~CNativeRecordFile()
 
 std::vector<CRecordCodes> CNativeRecordFile::scan(const std::function<void(int)>& theProgress)
 {
+    if (mLayout.mFamily == ENativeFamily::Asar) return fqorvScanAsarPackets(mFd, mLayout, theProgress);
+    if (mLayout.mFamily == ENativeFamily::Alos) return fqorvScanAlosRecords(mFd, mLayout, theProgress);
     // One read of the few hundred bytes before the samples per record: the page cache serves them
     // without copying the samples, which make up 96 % of the file. The reads are system calls of
     // a microsecond each, shared by the threads in contiguous parts; a record that fails is
@@ -494,4 +497,12 @@ void CNativeRecordFile::readIntoLines(uint64_t theFirst, std::size_t theCount, u
             }
         }
     }
+}
+
+void CNativeRecordFile::readBytes(uint64_t theOffset, std::size_t theCount, uint8_t* theBuffer)
+{
+    if (!fqorvReadAt(mFd, theOffset, theBuffer, theCount))
+        fqorvImportFail(CQORV_ERR_RASTER_READ, mLayout.mDataFile.string() + ": " + std::to_string(theCount) + " bytes at " +
+                                                   std::to_string(theOffset) + " can't be read" +
+                                                   (errno != 0 ? std::string(": ") + std::strerror(errno) : std::string()));
 }

@@ -15,6 +15,13 @@
 
 #include "qorv_native_archive.h"
 
+/// Outside files an archive may need: the ASAR instrument file (ASA_INS_AX) and an orbit file.
+/// Empty: not given (an ASAR reader then looks beside the product for one by its content).
+struct CNativeOutsideFiles {
+    std::filesystem::path mInstrument;
+    std::filesystem::path mOrbit;
+};
+
 /// Recognises theInput by its content (a CEOS product directory, its data or its leader file, or
 /// an ENVISAT-format file; the names do not matter) and reads its headers. Throws CImportFailure:
 /// 261122 when theInput does not exist, 979201 for anything that is not one of the formats (with
@@ -22,7 +29,9 @@
 /// 979202 for a CEOS data file without an ERS leader beside it, 979203 for record lengths that
 /// contradict the file descriptor, 979204 for a record layout of no known facility, 979206 for
 /// state vectors whose times go backwards, 979210 for a missing or impossible value.
-CNativeArchive fqorvReadNativeArchive(const std::filesystem::path& theInput);
+/// theOutside: the outside files given (an ASAR product needs its instrument file: 979212 when
+/// none is given or found beside it, 979213 for a file of another kind or size).
+CNativeArchive fqorvReadNativeArchive(const std::filesystem::path& theInput, const CNativeOutsideFiles& theOutside = {});
 
 /// The line records of an archive's data file, opened read-only.
 class CNativeRecordFile {
@@ -47,6 +56,10 @@ public:
     /// their line are dropped. The samples are copied once, from the page cache into the lines.
     /// CImportFailure 261125 on a read failure.
     void readIntoLines(uint64_t theFirst, std::size_t theCount, uint8_t* theLines, std::size_t theStride, long theShift);
+
+    /// Reads theCount bytes at theOffset of the data file (an ASAR packet by its offset and length
+    /// from the scan); CImportFailure 261125 on a read failure.
+    void readBytes(uint64_t theOffset, std::size_t theCount, uint8_t* theBuffer);
 
     const CNativeRecordLayout& layout() const { return mLayout; }
 

@@ -53,6 +53,9 @@ inline constexpr int CQORV_ERR_IMPORT_OPTION = 979208;           // an option do
 inline constexpr int CQORV_ERR_IMPORT_NO_LINES = 979209;         // the input holds no whole line
 inline constexpr int CQORV_ERR_IMPORT_VALUE = 979210;            // a value of the archive missing or impossible
 inline constexpr int CQORV_ERR_IMPORT_ORBIT_FILE = 979211;       // the orbit file cannot be read
+inline constexpr int CQORV_ERR_IMPORT_OUTSIDE_FILE = 979212;     // an outside file the product needs is not given
+inline constexpr int CQORV_ERR_IMPORT_OUTSIDE_KIND = 979213;     // an outside file of the wrong kind or size
+inline constexpr int CQORV_ERR_IMPORT_PRF_SWITCH = 979214;       // the leader's PRF switch contradicts the lines
 inline constexpr int CQORV_WARNINGS_PSEUDO_ID = 65280;          // a run that ended with warnings
 
 // Warning ids, numbered in the warning catalogue.
