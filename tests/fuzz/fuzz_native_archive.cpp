@@ -79,15 +79,7 @@ struct CFixedScene {
 
     CStateVector vectorAt(double theTime) const
     {
-        const CSimState s = CSimKeplerOrbit(mElements).state(theTime - mStart);
-        CStateVector v;
-        v.mTime = theTime;
-        const double p[3] = {s.mPos.x, s.mPos.y, s.mPos.z}, u[3] = {s.mVel.x, s.mVel.y, s.mVel.z};
-        for (int i = 0; i < 3; ++i) {
-            v.mPosition[i] = p[i];
-            v.mVelocity[i] = u[i];
-        }
-        return v;
+        return fqorvSimStateVector(CSimKeplerOrbit(mElements).state(theTime - mStart), theTime);
     }
 
     fs::path write(CSimNativeFormat theFormat, CSimCeosLayout theLayout, const fs::path& thePath) const

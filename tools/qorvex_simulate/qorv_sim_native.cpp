@@ -759,15 +759,7 @@ int plausibleOrbit(const CSimScene& s)
 
 CStateVector stateVector(const CSimScene& s, const CSimOrbit& theOrbit, double theDayTime)
 {
-    const CSimState st = theOrbit.state(sceneTime(s, theDayTime));
-    CStateVector v;
-    v.mTime = theDayTime;
-    const double aPos[3] = {st.mPos.x, st.mPos.y, st.mPos.z}, aVel[3] = {st.mVel.x, st.mVel.y, st.mVel.z};
-    for (int i = 0; i < 3; ++i) {
-        v.mPosition[i] = aPos[i];
-        v.mVelocity[i] = aVel[i];
-    }
-    return v;
+    return fqorvSimStateVector(theOrbit.state(sceneTime(s, theDayTime)), theDayTime);
 }
 
 /// CEOS: five vectors on whole milliseconds, the middle three spanning the scene, one of margin
@@ -951,4 +943,17 @@ void fqorvSimAddArchiveTruth(CJson& theTruth, const CSimScene& s, const CSimTime
         aGarbage.push(e);
     }
     theTruth["events"]["garbage"] = aGarbage;
+}
+
+CStateVector fqorvSimStateVector(const CSimState& theState, double theTime)
+{
+    CStateVector v;
+    v.mTime = theTime;
+    const double aPos[3] = {theState.mPos.x, theState.mPos.y, theState.mPos.z};
+    const double aVel[3] = {theState.mVel.x, theState.mVel.y, theState.mVel.z};
+    for (int i = 0; i < 3; ++i) {
+        v.mPosition[i] = aPos[i];
+        v.mVelocity[i] = aVel[i];
+    }
+    return v;
 }

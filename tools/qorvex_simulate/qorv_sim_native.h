@@ -78,6 +78,7 @@
 #include <vector>
 
 #include "qorv_native_archive.h"
+#include "qorv_sim_orbit.h"
 
 /// The record layouts of the ERS CEOS data file of the processing facilities.
 enum class CSimCeosLayout { PgsVmp, Co, Eic, Ccrs, Asf };
@@ -205,6 +206,9 @@ protected:
 /// ENVISAT format) or a file can't be created.
 std::unique_ptr<CSimNativeWriter> fqorvSimOpenNativeWriter(CSimNativeFormat theFormat, const CSimNativeProduct& theProduct,
                                                            const std::filesystem::path& thePath);
+
+/// A simulated orbit state as an archive's state vector at theTime (s from the reference day).
+CStateVector fqorvSimStateVector(const CSimState& theState, double theTime);
 
 /// The ENVISAT product name of a product: "SAR_IM__0P" ... ".E2" (".E1" for ERS-1), 62 characters,
 /// from the sensing start, its duration and the orbit.
