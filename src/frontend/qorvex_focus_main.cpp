@@ -2,6 +2,7 @@
 // line is focused by one run of the qorvex driver; up to --jobs runs go at once. Progress is
 // redrawn in place on a terminal and logged line by line otherwise; Ctrl-C stops the runs through
 // the working file, a second Ctrl-C ends them at once. A summary per scene closes the run.
+#include <algorithm>
 #include <signal.h>
 #include <unistd.h>
 
@@ -142,10 +143,14 @@ std::vector<std::unique_ptr<Scene>> makeScenes(const Options& o, const fs::path&
         q.mWrite = false;
         try {
             const CImportReport aReport = fqorvImport(q);
-            const bool aSeveral = aReport.mProducts.size() > 1;
-            for (const CImportedProduct& p : aReport.mProducts)
-                add(SceneInput{{}, fs::absolute(r), p.mName, aReport.mFormat, p.mFirstRecord,
+            // Each scene imports its own product: from the file that holds it alone (an ALOS image
+            // file of one polarisation), and only its records when that file holds several.
+            for (const CImportedProduct& p : aReport.mProducts) {
+                const bool aSeveral = std::count_if(aReport.mProducts.begin(), aReport.mProducts.end(),
+                                                    [&](const CImportedProduct& x) { return x.mInput == p.mInput; }) > 1;
+                add(SceneInput{{}, fs::absolute(p.mInput), p.mName, aReport.mFormat, p.mFirstRecord,
                                aSeveral ? p.mLastRecord - p.mFirstRecord + 1 : 0});
+            }
         } catch (const CImportFailure& e) {
             SceneInput aInput{{}, r, r.filename().string(), "", 0, 0};
             aScenes.push_back(std::make_unique<Scene>(o, aInput, theDriver, theImporter, theConfig));

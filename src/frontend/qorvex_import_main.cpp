@@ -37,16 +37,21 @@ const char* const CQORV_IMPORT_HELP =
     "usage: qorvex-import [options] INPUT [INPUT ...]\n"
     "\n"
     "Reads native raw archives and writes the raw products the chain focuses: for each product\n"
-    "NAME_raw and its header NAME_raw.sml, NAME being the sensor, the date and time of the first line\n"
-    "and the orbit (ERS2_20020615_174928_o37112). INPUT is an ERS-1/2 CEOS raw product (its directory,\n"
-    "its data file or its leader file) or an ERS level 0 file in the ENVISAT format (.E1, .E2); the\n"
-    "format is told by the content. The archive is only read.\n"
+    "NAME_raw and its header NAME_raw.sml, NAME being the sensor, the date and time of the first line,\n"
+    "the orbit and (ASAR, ALOS) the polarisation (ERS2_20020615_174928_o37112). INPUT is an ERS-1/2\n"
+    "CEOS raw product (its directory, its data file or its leader file), an ERS level 0 file in the\n"
+    "ENVISAT format (.E1, .E2), an ENVISAT ASAR image mode level 0 file (ASA_IM__0P, .N1) or an ALOS\n"
+    "PALSAR level 1.0 product (its directory or leader: one product per polarisation; or one IMG-\n"
+    "file); the format is told by the content. The archive is only read.\n"
     "\n"
     "Options (default in brackets):\n"
     "  --out DIR              directory of the products [.]\n"
     "  --orbit FILE           state vectors replacing the archive's: lines of\n"
-    "                         \"YYYY-MM-DDThh:mm:ss.ffffff x y z vx vy vz\", Earth-fixed, m and m/s [none]\n"
-    "  --aux FILE             instrument file of formats that need one (no ERS format does) [none]\n"
+    "                         \"YYYY-MM-DDThh:mm:ss.ffffff x y z vx vy vz\", Earth-fixed, m and m/s,\n"
+    "                         or a DORIS orbit file (DOR_VOR_AX), which ASAR needs [ASAR: the one\n"
+    "                         beside the product; else none]\n"
+    "  --aux FILE             the instrument file ASA_INS_AX of an ASAR product [the one beside it;\n"
+    "                         the other formats take none]\n"
     "  --lines FIRST:COUNT    import COUNT lines from line FIRST (from 0) of the data file [all]\n"
     "  --json FILE            write what was imported as JSON to FILE [none]\n"
     "  --config DIR           directory of Qorvex_configuration.ini [$QORVEX_INIT_DIR, else the\n"
@@ -131,6 +136,7 @@ CJson productJson(const CImportedProduct& p)
     x["lines"] = static_cast<long long>(p.mLines);
     x["fill_lines"] = static_cast<long long>(p.mFillLines);
     x["pulses"] = static_cast<long long>(p.mPulses);
+    x["input"] = p.mInput.string();
     x["first_record"] = static_cast<long long>(p.mFirstRecord);
     x["last_record"] = static_cast<long long>(p.mLastRecord);
     x["samples"] = d.mSamples;

@@ -28,16 +28,29 @@ void progress(const CImportRequest& r, const std::string& theStage, int thePerce
 }
 
 // ------------------------------------------------------------------------------------------------
-// Stage 1: the archive, and the outside files it may take
+// Stage 1: the archives (one per ALOS image file, else one), and the outside files they take
 
-CNativeArchive readArchive(const CImportRequest& r, std::vector<CStateVector>& theOutsideOrbit)
+struct CArchiveImport {
+    CNativeArchive mArchive;
+    std::vector<CStateVector> mOutsideOrbit;   // replaces the archive's vectors when given
+    CLinePlan mPlan;
+};
+
+std::vector<CArchiveImport> readArchives(const CImportRequest& r)
 {
     progress(r, "reading the headers", 0);
-    CNativeArchive a = fqorvReadNativeArchive(r.mInput);
-    if (!r.mAuxFile.empty())
-        fqorvImportFail(CQORV_ERR_IMPORT_OPTION, a.mFormat + " needs no auxiliary file: leave out --aux " + r.mAuxFile.string());
-    if (!r.mOrbitFile.empty()) theOutsideOrbit = fqorvReadOrbitFile(r.mOrbitFile, a.mReferenceDay);
-    return a;
+    std::vector<CArchiveImport> aImports;
+    for (CNativeArchive& a : fqorvReadNativeArchives(r.mInput, CNativeOutsideFiles{r.mAuxFile, r.mOrbitFile})) {
+        if (!r.mAuxFile.empty() && a.mFamily != ENativeFamily::Asar)
+            fqorvImportFail(CQORV_ERR_IMPORT_OPTION, a.mFormat + " needs no auxiliary file: leave out --aux " + r.mAuxFile.string());
+        CArchiveImport x;
+        // An ASAR reader takes its orbit file itself (its header holds a single vector).
+        if (!r.mOrbitFile.empty() && a.mFamily != ENativeFamily::Asar)
+            x.mOutsideOrbit = fqorvReadOrbitFile(r.mOrbitFile, a.mReferenceDay);
+        x.mArchive = std::move(a);
+        aImports.push_back(std::move(x));
+    }
+    return aImports;
 }
 
 // ------------------------------------------------------------------------------------------------
@@ -61,19 +74,22 @@ CLinePlan planLines(const CImportRequest& r, const CNativeArchive& a)
 // ------------------------------------------------------------------------------------------------
 // Stage 3: each product described and named; nothing is written before all are
 
-std::vector<CImportedProduct> describeProducts(const CImportRequest& r, const CNativeArchive& a, const CLinePlan& thePlan,
-                                               const std::vector<CStateVector>& theOutsideOrbit)
+void describeProducts(const CImportRequest& r, const CArchiveImport& theImport, bool theSeveral,
+                      std::set<std::string>& theNames, std::vector<CImportedProduct>& theProducts)
 {
-    std::vector<CImportedProduct> aProducts;
-    std::set<std::string> aNames;
-    for (const CPlannedProduct& p : thePlan.mProducts) {
+    const CNativeArchive& a = theImport.mArchive;
+    // The polarisation names the products of sensors that record more than one.
+    const std::string aPolarisation = a.mFamily == ENativeFamily::Ers ? std::string() : a.mPolarisation;
+    for (const CPlannedProduct& p : theImport.mPlan.mProducts) {
         CImportedProduct x;
-        x.mDescription = fqorvDescribeProduct(a, p, theOutsideOrbit, r.mOrbitFile.string());
+        x.mDescription = fqorvDescribeProduct(a, p, theImport.mOutsideOrbit, r.mOrbitFile.string());
         const CProductDescription& d = x.mDescription;
-        x.mName = fqorvProductName(a.mSensor, a.mReferenceDay, d.mStartTime, a.mOrbit);
+        const std::string aName = fqorvProductName(a.mSensor, a.mReferenceDay, d.mStartTime, a.mOrbit, aPolarisation);
+        x.mName = aName;
         // Two products of one file that begin within the same second keep apart.
-        for (int k = 2; aNames.count(x.mName) > 0; ++k) x.mName = fqorvProductName(a.mSensor, a.mReferenceDay, d.mStartTime, a.mOrbit) + "_" + std::to_string(k);
-        aNames.insert(x.mName);
+        for (int k = 2; theNames.count(x.mName) > 0; ++k) x.mName = aName + "_" + std::to_string(k);
+        theNames.insert(x.mName);
+        x.mInput = theSeveral ? a.mLayout.mDataFile : r.mInput;
         x.mRaster = r.mOutDir / (x.mName + "_raw");
         x.mHeader = r.mOutDir / (x.mName + "_raw.sml");
         x.mLines = static_cast<int64_t>(p.mLines.size());
@@ -87,56 +103,63 @@ std::vector<CImportedProduct> describeProducts(const CImportRequest& r, const CN
         x.mTimeSource = p.mTimeSource;
         x.mNotes = p.mNotes;
         x.mNotes.insert(x.mNotes.end(), d.mNotes.begin(), d.mNotes.end());
-        aProducts.push_back(std::move(x));
+        theProducts.push_back(std::move(x));
     }
-    return aProducts;
 }
 
 }  // namespace
 
-std::string fqorvProductName(const std::string& theSensor, long theDay, double theSeconds, int theOrbit)
+std::string fqorvProductName(const std::string& theSensor, long theDay, double theSeconds, int theOrbit,
+                             const std::string& thePolarisation)
 {
     CQorvDate d;
     d.set(theDay, std::floor(theSeconds));
     const long s = std::lround(d.mSeconds);
     char aName[96];
-    std::string aSensor;
-    for (char c : theSensor)
+    std::string aSensor = theSensor == "ENVISAT-1" ? "ASAR" : theSensor == "ALOS_PALSAR" ? "PALSAR" : "";
+    for (char c : aSensor.empty() ? theSensor : std::string())
         if (c != '-' && c != '_') aSensor += c;
     std::snprintf(aName, sizeof aName, "%s_%04d%02d%02d_%02ld%02ld%02ld", aSensor.c_str(), d.mYear, d.mMonth, d.mDay, s / 3600,
                   s / 60 % 60, s % 60);
     std::string n = aName;
     if (theOrbit >= 0) n += "_o" + std::to_string(theOrbit);
+    if (!thePolarisation.empty()) n += "_" + thePolarisation;
     return n;
 }
 
 CImportReport fqorvImport(const CImportRequest& theRequest)
 {
-    std::vector<CStateVector> aOutsideOrbit;
-    const CNativeArchive a = readArchive(theRequest, aOutsideOrbit);
+    std::vector<CArchiveImport> aImports = readArchives(theRequest);
+    const bool aSeveral = aImports.size() > 1;
+    const CNativeArchive& aFirst = aImports.front().mArchive;
     CImportReport aReport;
     aReport.mSource = theRequest.mInput;
-    aReport.mFormat = a.mFormat;
-    aReport.mSensor = a.mSensor;
-    aReport.mLayout = a.mLayoutName;
-    aReport.mFacility = a.mFacility;
-    aReport.mProcessor = a.mProcessor;
-    aReport.mProductName = a.mProductName;
-    aReport.mOrbit = a.mOrbit;
-    aReport.mRecords = a.mLayout.mRecords;
-    aReport.mDeclaredRecords = a.mLayout.mDeclaredRecords;
-    aReport.mSamples = a.mLayout.mSamples;
-    aReport.mNotes = a.mNotes;
-    if (a.mTruncated)
-        aReport.mWarnings.emplace_back(CQORV_WARN_IMPORT_TRUNCATED, std::to_string(a.mLayout.mRecords) + " whole lines of the " +
-                                                                        std::to_string(a.mLayout.mDeclaredRecords) + " declared");
-
-    const CLinePlan aPlan = planLines(theRequest, a);
-    aReport.mNotes.insert(aReport.mNotes.end(), aPlan.mNotes.begin(), aPlan.mNotes.end());
-    for (const std::string& w : aPlan.mWarnings) aReport.mWarnings.emplace_back(CQORV_WARN_IMPORT_CLOCK, w);
-    aReport.mProducts = describeProducts(theRequest, a, aPlan, aOutsideOrbit);
-    for (const CImportedProduct& x : aReport.mProducts)
-        for (const auto& w : x.mDescription.mWarnings) aReport.mWarnings.push_back(w);
+    aReport.mFormat = aFirst.mFormat;
+    aReport.mSensor = aFirst.mSensor;
+    aReport.mLayout = aFirst.mLayoutName;
+    aReport.mFacility = aFirst.mFacility;
+    aReport.mProcessor = aFirst.mProcessor;
+    aReport.mProductName = aFirst.mProductName;
+    aReport.mOrbit = aFirst.mOrbit;
+    aReport.mSamples = aFirst.mLayout.mSamples;
+    std::set<std::string> aNames;
+    for (CArchiveImport& x : aImports) {
+        const CNativeArchive& a = x.mArchive;
+        // With several image files, what is said of one names it.
+        const std::string aOf = aSeveral ? a.mLayout.mDataFile.filename().string() + ": " : std::string();
+        aReport.mRecords += a.mLayout.mRecords;
+        aReport.mDeclaredRecords += a.mLayout.mDeclaredRecords;
+        for (const std::string& n : a.mNotes) aReport.mNotes.push_back(aOf + n);
+        if (a.mTruncated)
+            aReport.mWarnings.emplace_back(CQORV_WARN_IMPORT_TRUNCATED, aOf + std::to_string(a.mLayout.mRecords) + " whole lines of the " +
+                                                                            std::to_string(a.mLayout.mDeclaredRecords) + " declared");
+        x.mPlan = planLines(theRequest, a);
+        for (const std::string& n : x.mPlan.mNotes) aReport.mNotes.push_back(aOf + n);
+        for (const std::string& w : x.mPlan.mWarnings) aReport.mWarnings.emplace_back(CQORV_WARN_IMPORT_CLOCK, aOf + w);
+        describeProducts(theRequest, x, aSeveral, aNames, aReport.mProducts);
+    }
+    for (const CImportedProduct& p : aReport.mProducts)
+        for (const auto& w : p.mDescription.mWarnings) aReport.mWarnings.push_back(w);
     if (!theRequest.mWrite) return aReport;
 
     // Stage 4: the products, one after the other.
@@ -144,11 +167,14 @@ CImportReport fqorvImport(const CImportRequest& theRequest)
     fs::create_directories(theRequest.mOutDir, e);
     if (!fs::is_directory(theRequest.mOutDir, e))
         fqorvImportFail(CQORV_ERR_CREATE_FILE, "the output directory " + theRequest.mOutDir.string() + " cannot be made");
-    CNativeRecordFile aRecords(a.mLayout);
-    for (std::size_t i = 0; i < aReport.mProducts.size(); ++i) {
-        const CImportedProduct& x = aReport.mProducts[i];
-        fqorvWriteRawProduct(a, aRecords, aPlan.mProducts[i], x.mDescription, x.mRaster,
-                             [&](int p) { progress(theRequest, "writing " + x.mName, p); });
+    std::size_t aProduct = 0;
+    for (const CArchiveImport& x : aImports) {
+        CNativeRecordFile aRecords(x.mArchive.mLayout);
+        for (const CPlannedProduct& p : x.mPlan.mProducts) {
+            const CImportedProduct& r = aReport.mProducts[aProduct++];
+            fqorvWriteRawProduct(x.mArchive, aRecords, p, r.mDescription, r.mRaster,
+                                 [&](int thePercent) { progress(theRequest, "writing " + r.mName, thePercent); });
+        }
     }
     return aReport;
 }

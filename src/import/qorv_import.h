@@ -26,7 +26,9 @@ struct CImportRequest {
 };
 
 struct CImportedProduct {
-    std::string mName;                     // NAME: sensor, date and time of the first pulse, orbit
+    std::string mName;                     // NAME: sensor, date and time of the first pulse, orbit, polarisation
+    std::filesystem::path mInput;          // the input that holds this product's records alone (an ALOS
+                                           // image file when the input held several, else the input)
     std::filesystem::path mRaster;         // OUT/NAME_raw (written only when asked)
     std::filesystem::path mHeader;         // OUT/NAME_raw.sml
     int64_t mLines = 0;                    // records of the product, fill lines included
@@ -44,7 +46,7 @@ struct CImportReport {
     std::filesystem::path mSource;
     std::string mFormat, mSensor, mLayout, mFacility, mProcessor, mProductName;
     int mOrbit = -1;
-    uint64_t mRecords = 0, mDeclaredRecords = 0;
+    uint64_t mRecords = 0, mDeclaredRecords = 0;   // of every data file read (ALOS: every image file)
     int mSamples = 0;
     std::vector<std::string> mNotes;
     std::vector<std::pair<int, std::string>> mWarnings;   // warning id, words
@@ -54,6 +56,8 @@ struct CImportReport {
 /// Imports theRequest's input; throws CImportFailure (the ids of docs/importers.md).
 CImportReport fqorvImport(const CImportRequest& theRequest);
 
-/// NAME of a product: "ERS2_20020615_174928" (sensor without its dash, date and time of the first
-/// pulse to the second), with "_o<orbit>" when the archive gives its orbit.
-std::string fqorvProductName(const std::string& theSensor, long theDay, double theSeconds, int theOrbit);
+/// NAME of a product: "ERS2_20020615_174928" (sensor: ERS1, ERS2, ASAR or PALSAR; date and time of
+/// the first pulse to the second), with "_o<orbit>" when the archive gives its orbit and
+/// "_<polarisation>" when given (ASAR and ALOS: "PALSAR_20070312_101530_HV").
+std::string fqorvProductName(const std::string& theSensor, long theDay, double theSeconds, int theOrbit,
+                             const std::string& thePolarisation = {});

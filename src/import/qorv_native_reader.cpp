@@ -382,6 +382,13 @@ CNativeArchive fqorvReadNativeArchive(const fs::path& theInput, const CNativeOut
     return aArchive;
 }
 
+std::vector<CNativeArchive> fqorvReadNativeArchives(const fs::path& theInput, const CNativeOutsideFiles& theOutside)
+{
+    std::vector<CNativeArchive> aArchives;
+    aArchives.push_back(fqorvReadNativeArchive(theInput, theOutside));
+    return aArchives;
+}
+
 // ---------------------------------------------------------------------------------------------
 // The line records
 

@@ -33,6 +33,10 @@ struct CNativeOutsideFiles {
 /// none is given or found beside it, 979213 for a file of another kind or size).
 CNativeArchive fqorvReadNativeArchive(const std::filesystem::path& theInput, const CNativeOutsideFiles& theOutside = {});
 
+/// Every archive theInput holds: one for an ERS or ASAR input or an ALOS image file, one per ALOS
+/// image file (polarisation) for an ALOS leader or product directory. Failures as above.
+std::vector<CNativeArchive> fqorvReadNativeArchives(const std::filesystem::path& theInput, const CNativeOutsideFiles& theOutside = {});
+
 /// The line records of an archive's data file, opened read-only.
 class CNativeRecordFile {
 public:
