@@ -150,48 +150,79 @@ TEST(ImportRun, BrokenInputsFailWithTheirIdsAndLeaveNoProduct)
     EXPECT_NE(r.mStdout.find(": 699 lines"), std::string::npos) << r.mStdout;
 }
 
-TEST(ImportRun, ArchivesOfBothFormatsFocusAtTheTruth)
+/// A scene of each format: the simulator's preset and format, the archive it writes, the scene
+/// with its faults, the clutter's extent, and how far the block omega-k lets the azimuth
+/// sidelobes of a clean scene rise over the ideal.
+struct FormatCase {
+    const char* mFormat;
+    const char* mPreset;
+    const char* mArchive;                  // path of the archive from the root: "" the root, else a suffix
+    std::vector<std::string> mScene;
+    const char* mMargin;                   // clutter beyond the ends: half a footprint and the squint
+    std::size_t mScenes;                   // products (scenes) the archive holds
+    double mAzimuthPslrDb;
+};
+
+TEST(ImportRun, ArchivesOfEveryFormatFocusAtTheTruth)
 {
     // Scenes in clutter take minutes under the sanitizers; the tests above run the same code there.
 #if defined(__SANITIZE_ADDRESS__)
     GTEST_SKIP() << "accuracy on clutter scenes: release suite";
 #endif
-    for (const std::string aFormat : {"ceos", "e2"}) {
-        SCOPED_TRACE(aFormat);
+    // Lost lines, a repeated line and a window shift inside the second row's aperture; ASAR with
+    // noise packets before the first echo and a calibration packet in the place of one; ALOS FBD
+    // with its two polarisations. At L band one processing velocity per block leaves the azimuth
+    // sidelobes 2.5 to 3 dB over the ideal (docs/decisions-azimuth.md).
+    const std::vector<FormatCase> aCases = {
+        {"ceos", "ers2", "", {"--lines", "4096", "--samples", "5616", "--drop-lines", "1000,1001", "--repeat-line", "2000", "--swst-change", "2600:22"}, "1300", 1, 1.5},
+        {"e2", "ers2", ".E2", {"--lines", "4096", "--samples", "5616", "--drop-lines", "1000,1001", "--repeat-line", "2000", "--swst-change", "2600:22"}, "1300", 1, 1.5},
+        {"n1", "envisat", ".N1", {"--lines", "4096", "--samples", "2048", "--drop-lines", "1000,1001", "--repeat-line", "2000", "--swst-change", "2600:40", "--cal-packets", "1500"}, "1300", 1, 1.5},
+        {"alos", "alos-fbd", "", {"--lines", "9216", "--samples", "1280", "--drop-lines", "3000,3001", "--repeat-line", "4000", "--swst-change", "5000:16"}, "4000", 2, 3.5},
+    };
+    for (const FormatCase& c : aCases) {
+        SCOPED_TRACE(c.mFormat);
         qtest::DriverSandbox aBox;
-        // Lost lines, a repeated line and a window shift of 22 codes inside the second row's aperture.
-        const std::vector<std::string> aScene = {"--lines", "4096", "--samples", "5616", "--drop-lines", "1000,1001",
-                                                 "--repeat-line", "2000", "--swst-change", "2600:22"};
-        std::vector<std::string> aClutter = aScene;
+        auto simulate = [&](const std::string& theName, std::vector<std::string> theOptions) {
+            theOptions.insert(theOptions.begin(), {"--preset", c.mPreset, "--format", c.mFormat});
+            const qtest::RunResult r = aBox.simulate((aBox.data() / theName).string(), theOptions);
+            EXPECT_EQ(r.mStatus, 0) << r.mStderr;
+            return fs::path((aBox.data() / theName).string() + c.mArchive);
+        };
+        std::vector<std::string> aClutter = c.mScene;
         aClutter.insert(aClutter.end(), {"--targets", "grid:2x2", "--scatterers", "6000", "--scatterer-rms", "0.3",
-                                         "--scatterer-margin", "1300"});
-        const fs::path aArchive = simulateArchive(aBox, aBox.data() / "clutter", aFormat, aClutter);
+                                         "--scatterer-margin", c.mMargin});
+        const fs::path aArchive = simulate("clutter", aClutter);
 
         // The whole chain from the archive: Doppler, ambiguity and velocity estimated.
         const fs::path aOut = aBox.data() / "focused";
         const fs::path aSummary = aBox.data() / "summary.json";
         const qtest::RunResult aRun = run(
-            aBox, kFocus, {"--out", aOut.string(), "--doppler-degree", "0", "--keep", "--json", aSummary.string(), aArchive.string()}, 900);
+            aBox, kFocus, {"--out", aOut.string(), "--doppler-degree", "0", "--keep", "--json", aSummary.string(), aArchive.string()}, 1200);
         ASSERT_EQ(aRun.mStatus, 0) << aRun.mStdout << aRun.mStderr;
-        const CJson s = CJson::parseFile(aSummary.string())["scenes"][std::size_t{0}];
-        EXPECT_EQ(s["source"].string(), aArchive.string());
+        const CJson aScenes = CJson::parseFile(aSummary.string())["scenes"];
+        ASSERT_EQ(aScenes.size(), c.mScenes) << aRun.mStdout;
         const CJson aTruth = CJson::parseFile((aBox.data() / "clutter_truth.json").string());
         const double aPrf = aTruth["radar"]["prf"].number();
-        std::printf("%s: Doppler %.2f Hz (truth %.2f), velocity %.3f m/s (truth %.3f)\n", aFormat.c_str(), s["doppler_hz"].number(),
-                    aTruth["doppler"]["centroid"].number(), s["velocity_m_s"].number(),
-                    aTruth["velocity"]["true_processing_velocity"].number());
-        EXPECT_NEAR(s["doppler_hz"].number(), aTruth["doppler"]["centroid"].number(), 0.01 * aPrf);
-        EXPECT_NEAR(s["velocity_m_s"].number(), aTruth["velocity"]["true_processing_velocity"].number(), 0.002 * 7100.0);
-        const fs::path aSlc = aOut / (s["name"].string() + "_slc");
-        const qtest::RunResult aIrf = run(aBox, qtest::binaryDir() / "qorvex_irf",
-                                          {"--slc", aSlc.string(), "--truth", (aBox.data() / "clutter_truth.json").string(),
-                                           "--only-isolated", "--json", (aBox.data() / "irf.json").string()});
-        ASSERT_EQ(aIrf.mStatus, 0) << aIrf.mStdout << aIrf.mStderr;
-        const CJson aTargets = CJson::parseFile((aBox.data() / "irf.json").string())["targets"];
-        ASSERT_EQ(aTargets.size(), 4u) << aIrf.mStdout;
-        for (const CJson& t : aTargets.elements()) {
-            EXPECT_NEAR(t["line_error"].number(), 0.0, 0.5) << aIrf.mStdout;
-            EXPECT_NEAR(t["pixel_error"].number(), 0.0, 0.25) << aIrf.mStdout;
+        for (const CJson& s : aScenes.elements()) {
+            SCOPED_TRACE(s["name"].string());
+            std::printf("%s: Doppler %.2f Hz (truth %.2f), velocity %.3f m/s (truth %.3f)\n", s["name"].string().c_str(),
+                        s["doppler_hz"].number(), aTruth["doppler"]["centroid"].number(), s["velocity_m_s"].number(),
+                        aTruth["velocity"]["true_processing_velocity"].number());
+            EXPECT_NEAR(s["doppler_hz"].number(), aTruth["doppler"]["centroid"].number(), 0.01 * aPrf);
+            EXPECT_NEAR(s["velocity_m_s"].number(), aTruth["velocity"]["true_processing_velocity"].number(),
+                        0.002 * aTruth["velocity"]["true_processing_velocity"].number());
+            const fs::path aSlc = aOut / (s["name"].string() + "_slc");
+            const fs::path aIrfJson = aBox.data() / (s["name"].string() + "_irf.json");
+            const qtest::RunResult aIrf = run(aBox, qtest::binaryDir() / "qorvex_irf",
+                                              {"--slc", aSlc.string(), "--truth", (aBox.data() / "clutter_truth.json").string(),
+                                               "--only-isolated", "--json", aIrfJson.string()});
+            ASSERT_EQ(aIrf.mStatus, 0) << aIrf.mStdout << aIrf.mStderr;
+            const CJson aTargets = CJson::parseFile(aIrfJson.string())["targets"];
+            ASSERT_EQ(aTargets.size(), 4u) << aIrf.mStdout;
+            for (const CJson& t : aTargets.elements()) {
+                EXPECT_NEAR(t["line_error"].number(), 0.0, 0.5) << aIrf.mStdout;
+                EXPECT_NEAR(t["pixel_error"].number(), 0.0, 0.25) << aIrf.mStdout;
+            }
         }
 
         // Clutter masks the sidelobes: the same scene without clutter and noise, imported, given the
@@ -201,18 +232,19 @@ TEST(ImportRun, ArchivesOfBothFormatsFocusAtTheTruth)
         // the swath away, one processing velocity per block leaves the azimuth sidelobes 1.5 to
         // 1.7 dB over the ideal, imported or not (docs/decisions-azimuth.md). Its codes keep an rms
         // of 2 so that the few targets' echoes never clip.
-        std::vector<std::string> aClean = aScene;
+        std::vector<std::string> aClean = c.mScene;
         aClean.insert(aClean.end(), {"--targets", "grid:2x1", "--no-noise", "--rms-dn", "2"});
-        const fs::path aCleanArchive = simulateArchive(aBox, aBox.data() / "clean", aFormat, aClean);
+        const fs::path aCleanArchive = simulate("clean", aClean);
         const qtest::RunResult aImport = run(aBox, kImport, {"--out", (aBox.data() / "raw").string(), "--json",
                                                              (aBox.data() / "clean.json").string(), aCleanArchive.string()});
         ASSERT_LE(aImport.mStatus, 1) << aImport.mStderr;
-        const std::string aCleanRaw =
-            CJson::parseFile((aBox.data() / "clean.json").string())["inputs"][std::size_t{0}]["products"][std::size_t{0}]["raster"].string();
+        const CJson aCleanImport = CJson::parseFile((aBox.data() / "clean.json").string());
+        const std::string aCleanRaw = aCleanImport["inputs"][std::size_t{0}]["products"][std::size_t{0}]["raster"].string();
         {
+            const std::string aName = aScenes[std::size_t{0}]["name"].string();
             qtest::InProcessEnvironment aEnv;
             auto aFrom = CDescriptionHeader::makeFull(), aTo = CDescriptionHeader::makeFull();
-            ASSERT_TRUE(aFrom->read((aOut / (s["name"].string() + ".qorvex") / (s["name"].string() + "_raw")).c_str(), true));
+            ASSERT_TRUE(aFrom->read((aOut / (aName + ".qorvex") / (aName + "_raw")).c_str(), true));
             ASSERT_TRUE(aTo->read(aCleanRaw.c_str(), true));
             const CDescriptionField& aTable = (*aFrom)["Processing.DopCenRangeCoeff"];
             CDescriptionField& aCopy = (*aTo)["Processing.DopCenRangeCoeff"];
@@ -223,11 +255,11 @@ TEST(ImportRun, ArchivesOfBothFormatsFocusAtTheTruth)
             ASSERT_TRUE(aTo->write(aCleanRaw.c_str(), true, false));
         }
         const qtest::RunResult aCleanRun =
-            run(aBox, kFocus, {"--out", aBox.data().string(), "--skip", "1", "--skip", "3", "--no-ambiguity", "--no-multilook", aCleanRaw}, 900);
+            run(aBox, kFocus, {"--out", aBox.data().string(), "--skip", "1", "--skip", "3", "--no-ambiguity", "--no-multilook", aCleanRaw}, 1200);
         ASSERT_EQ(aCleanRun.mStatus, 0) << aCleanRun.mStdout;
         const std::string aName = fs::path(aCleanRaw).filename().string();
         qtest::expectIdealTargets(aBox, aBox.data() / (aName.substr(0, aName.size() - 4) + "_slc"),
-                                  aBox.data() / "clean_truth.json", 2);
+                                  aBox.data() / "clean_truth.json", 2, c.mAzimuthPslrDb);
     }
 }
 
