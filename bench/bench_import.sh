@@ -1,8 +1,10 @@
 #!/usr/bin/env bash
-# Imports a full ERS frame (28,000 lines x 5,616 samples) written by the simulator as an ERS CEOS
-# product and as an ENVISAT-format .E2 file, and prints each import's wall time and peak memory
-# beside plain copies of the same data file in the same run, into the same directory, and the
-# ratios: dd with 8 MB blocks (read into the program and written from it, as the import does) and
+# Imports full frames written by the simulator: ERS (28,000 lines x 5,616 samples) as an ERS CEOS
+# product and as an ENVISAT-format .E2 file, ENVISAT ASAR (30,000 packets, FBAQ decoded into
+# complex floats) as an .N1 file, ALOS PALSAR FBS (28,000 lines x 5,152 samples) as a level 1.0
+# product, and prints each import's wall time and peak memory beside plain copies of the same data
+# file in the same run, into the same directory (for ASAR also of the written product, eight times
+# the bytes of the packets' samples), and the ratios: dd with 8 MB blocks (read into the program and written from it, as the import does) and
 # cp (which has the kernel copy the file, copy_file_range, without passing it through the program). Best of QORVEX_BENCH_ROUNDS runs (3) each, the input warm in the page cache, and
 # a scratch file written and deleted before each run so that the output goes into memory the
 # machine has used before (see bench_chain.sh).
@@ -37,19 +39,34 @@ best() {
   echo "$wall $rss"
 }
 
-for format in ceos e2; do
-  echo "== simulating a full ERS frame as $format"
-  "$bin/qorvex_simulate" --preset ers2 --full-frame --format "$format" --no-noise --quiet --config "$config" \
+for case in "ers2 ceos" "ers2 e2" "envisat n1" "alos alos"; do
+  read -r preset format <<< "$case"
+  echo "== simulating a full $preset frame as $format"
+  "$bin/qorvex_simulate" --preset "$preset" --full-frame --format "$format" --no-noise --quiet --config "$config" \
     --out "$dir/frame_$format" > /dev/null
-  if [ "$format" = ceos ]; then input="$dir/frame_ceos"; data="$input/DAT_01.001"; else input=$(ls "$dir"/frame_e2.E?); data=$input; fi
+  case $format in
+    ceos) input="$dir/frame_ceos"; data="$input/DAT_01.001" ;;
+    alos) input="$dir/frame_alos"; data=$(ls "$input"/IMG-HH-*) ;;
+    n1) input="$dir/frame_n1.N1"; data=$input ;;
+    *) input=$(ls "$dir"/frame_e2.E?); data=$input ;;
+  esac
   cat "$data" > /dev/null  # warm in the page cache, as the copy finds it
   read -r dw dr <<< "$(best dd if="$data" of="$dir/out/copy" bs=8M status=none)"
   read -r cw cr <<< "$(best cp "$data" "$dir/out/copy")"
-  # The import of an ENVISAT-format file ends with status 1: its orbit is propagated from one vector.
+  # Status 1 is an import with warnings (an .E2 file's orbit is propagated from one vector).
   read -r iw ir <<< "$(best sh -c '"$0" --quiet --config "$1" --out "$2" "$3"; [ $? -le 1 ]' "$bin/qorvex-import" "$config" "$dir/out" "$input")"
   size=$(stat -c %s "$data")
   awk -v s="$size" -v dw="$dw" -v cw="$cw" -v iw="$iw" -v ir="$ir" 'BEGIN {
     printf "   data file %.0f MB: import %.3f s (%d MB peak); dd %.3f s, ratio %.2f; cp %.3f s, ratio %.2f\n",
       s / 1048576, iw, ir / 1024, dw, iw / dw, cw, iw / cw }'
-  rm -rf "$dir/frame_$format"*
+  if [ "$format" = n1 ]; then
+    product=$(ls "$dir"/out/*_raw | head -1)
+    mv "$product" "$dir/product"
+    read -r pw pr <<< "$(best dd if="$dir/product" of="$dir/out/copy" bs=8M status=none)"
+    read -r qw qr <<< "$(best cp "$dir/product" "$dir/out/copy")"
+    awk -v s="$(stat -c %s "$dir/product")" -v pw="$pw" -v qw="$qw" -v iw="$iw" 'BEGIN {
+      printf "   written product %.0f MB: dd %.3f s, ratio %.2f; cp %.3f s, ratio %.2f\n", s / 1048576, pw, iw / pw, qw, iw / qw }'
+    rm -f "$dir/product"
+  fi
+  rm -rf "$dir/frame_$format"* "$dir/out"
 done
