@@ -5,12 +5,14 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <cctype>
 #include <cerrno>
 #include <cmath>
 #include <cstdlib>
 #include <cstring>
 #include <utility>
 
+#include "qorv_date.h"
 #include "qorv_import_failure.h"
 #include "qorv_native_formats.h"
 
@@ -153,4 +155,94 @@ CCeosFields fqorvReadCeosRecord(const std::filesystem::path& theFile, const CCeo
         fqorvImportFail(CQORV_ERR_RASTER_READ, theFile.string() + ": " + theName + " at byte " +
                                                    std::to_string(theRecord.mOffset) + " is cut off");
     return CCeosFields(std::move(aBytes), theName);
+}
+
+bool fqorvParseCeosTime(const std::string& theText, long& theDay, double& theSeconds)
+{
+    if (theText.size() < 14 || theText.find_first_not_of("0123456789") != std::string::npos) return false;
+    const auto number = [&](std::size_t thePos, std::size_t theCount) { return std::stoi(theText.substr(thePos, theCount)); };
+    const int aYear = number(0, 4), aMonth = number(4, 2), aDay = number(6, 2);
+    const int aHour = number(8, 2), aMinute = number(10, 2), aSecond = number(12, 2);
+    if (aYear < 1970 || aMonth < 1 || aMonth > 12 || aDay < 1 || aDay > 31 || aHour > 23 || aMinute > 59 || aSecond > 60)
+        return false;
+    double aFraction = 0.0;
+    double aScale = 0.1;
+    for (std::size_t i = 14; i < theText.size(); ++i, aScale *= 0.1) aFraction += (theText[i] - '0') * aScale;
+    theDay = fqorvDaysFromCivil(aYear, aMonth, aDay);
+    theSeconds = aHour * 3600.0 + aMinute * 60.0 + aSecond + aFraction;
+    return true;
+}
+
+void fqorvCeosFailValue(const CCeosFields& theRecord, int thePos, const std::string& theWhat, const std::string& theText)
+{
+    fqorvImportFail(CQORV_ERR_IMPORT_VALUE, theRecord.name() + ": " + theWhat + " at byte " + std::to_string(thePos) +
+                                                " is missing or not understood ('" + theText + "')");
+}
+
+int64_t fqorvCeosRequiredInteger(const CCeosFields& theRecord, int thePos, int theWidth, const std::string& theWhat)
+{
+    const std::optional<int64_t> aValue = theRecord.integer(thePos, theWidth);
+    if (!aValue) fqorvCeosFailValue(theRecord, thePos, theWhat, theRecord.text(thePos, theWidth));
+    return *aValue;
+}
+
+double fqorvCeosRequiredReal(const CCeosFields& theRecord, int thePos, int theWidth, const std::string& theWhat)
+{
+    const double aValue = theRecord.real(thePos, theWidth);
+    if (std::isnan(aValue)) fqorvCeosFailValue(theRecord, thePos, theWhat, theRecord.text(thePos, theWidth));
+    return aValue;
+}
+
+namespace {
+
+/// Earth-fixed frames are taken; an inertial frame would need a rotation the leader does not give.
+void checkFrame(const CCeosFields& thePpr, std::vector<std::string>& theNotes)
+{
+    std::string aFrame = thePpr.text(204, 64);
+    for (char& c : aFrame) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
+    const auto has = [&](const char* theWord) { return aFrame.find(theWord) != std::string::npos; };
+    if (has("INERTIAL") || has("ECI") || has("J2000") || has("EME2000") || has("MEAN OF") || has("TRUE OF"))
+        fqorvImportFail(CQORV_ERR_IMPORT_VALUE, thePpr.name() + ": the state vectors are in the inertial frame '" +
+                                                    thePpr.text(204, 64) + "'; Earth-fixed vectors are needed");
+    if (aFrame.empty()) {
+        theNotes.push_back("the leader names no frame of its state vectors: taken as Earth-fixed");
+    } else if (!(has("ROTATING") || has("FIXED") || has("ECR") || has("ECEF") || has("GREENWICH") || has("ITRF"))) {
+        fqorvImportFail(CQORV_ERR_IMPORT_VALUE, thePpr.name() + ": the frame of the state vectors '" +
+                                                    thePpr.text(204, 64) + "' is not known as Earth-fixed");
+    }
+}
+
+}  // namespace
+
+std::vector<CStateVector> fqorvReadCeosPlatformPosition(const CCeosFields& thePpr, long theReferenceDay,
+                                                        std::vector<std::string>& theNotes)
+{
+    const int64_t aCount = fqorvCeosRequiredInteger(thePpr, 140, 4, "number of state vectors");
+    if (aCount < 1) fqorvCeosFailValue(thePpr, 140, "number of state vectors", thePpr.text(140, 4));
+    const int aYear = static_cast<int>(fqorvCeosRequiredInteger(thePpr, 144, 4, "year of the state vectors"));
+    const int aMonth = static_cast<int>(fqorvCeosRequiredInteger(thePpr, 148, 4, "month of the state vectors"));
+    const int aDay = static_cast<int>(fqorvCeosRequiredInteger(thePpr, 152, 4, "day of the state vectors"));
+    if (aMonth < 1 || aMonth > 12 || aDay < 1 || aDay > 31)
+        fqorvCeosFailValue(thePpr, 144, "date of the state vectors", thePpr.text(144, 12));
+    const double aFirst = fqorvCeosRequiredReal(thePpr, 160, 22, "time of the first state vector");
+    const double aInterval = fqorvCeosRequiredReal(thePpr, 182, 22, "interval of the state vectors");
+    if (aCount > 1 && !(aInterval > 0.0))
+        fqorvImportFail(CQORV_ERR_IMPORT_TIME_ORDER, thePpr.name() + ": the state vectors' interval is " +
+                                                         thePpr.text(182, 22) + " s, not increasing times");
+    checkFrame(thePpr, theNotes);
+
+    const double aDayStart = static_cast<double>(fqorvDaysFromCivil(aYear, aMonth, aDay) - theReferenceDay) * 86400.0;
+    std::vector<CStateVector> aVectors;
+    for (int64_t k = 0; k < aCount; ++k) {
+        const int aBase = 386 + 132 * static_cast<int>(k);
+        CStateVector aVector;
+        aVector.mTime = aDayStart + aFirst + static_cast<double>(k) * aInterval;
+        const std::string aWhat = "state vector " + std::to_string(k + 1);
+        for (int i = 0; i < 3; ++i) {
+            aVector.mPosition[i] = fqorvCeosRequiredReal(thePpr, aBase + 22 * i, 22, aWhat);
+            aVector.mVelocity[i] = fqorvCeosRequiredReal(thePpr, aBase + 66 + 22 * i, 22, aWhat);
+        }
+        aVectors.push_back(aVector);
+    }
+    return aVectors;
 }

@@ -16,6 +16,8 @@
 #include <string>
 #include <vector>
 
+#include "qorv_state_vectors.h"
+
 /// Bytes of the record header.
 inline constexpr int CQORV_CEOS_HEADER_BYTES = 12;
 
@@ -89,3 +91,22 @@ private:
 /// Reads theRecord of theFile whole into a CCeosFields named theName (261125 on a read failure).
 CCeosFields fqorvReadCeosRecord(const std::filesystem::path& theFile, const CCeosRecord& theRecord,
                                 const std::string& theName);
+
+/// Days since 1970 and seconds of the day from a CEOS time "YYYYMMDDhhmmss" followed by the
+/// digits of the fraction (three in the leaders: milliseconds); false when it is not one.
+bool fqorvParseCeosTime(const std::string& theText, long& theDay, double& theSeconds);
+
+/// An In or Fn field that must be stated: CImportFailure 979210 naming the record, the byte and
+/// theWhat when it is blank, a filler or not a number.
+int64_t fqorvCeosRequiredInteger(const CCeosFields& theRecord, int thePos, int theWidth, const std::string& theWhat);
+double fqorvCeosRequiredReal(const CCeosFields& theRecord, int thePos, int theWidth, const std::string& theWhat);
+/// CImportFailure 979210: theWhat at byte thePos of theRecord is missing or not understood.
+[[noreturn]] void fqorvCeosFailValue(const CCeosFields& theRecord, int thePos, const std::string& theWhat,
+                                     const std::string& theText);
+
+/// The state vectors of a leader's platform position record (count @140, date @144..152, time of
+/// the first @160, interval @182, frame @204, x y z vx vy vz @386 + 132 k), timed in seconds from
+/// the midnight of theReferenceDay (days since 1970). Only Earth-fixed frames are taken (979210);
+/// an interval that is not positive is 979206. Notes for the report go to theNotes.
+std::vector<CStateVector> fqorvReadCeosPlatformPosition(const CCeosFields& thePpr, long theReferenceDay,
+                                                        std::vector<std::string>& theNotes);

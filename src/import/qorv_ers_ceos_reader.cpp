@@ -34,44 +34,6 @@ constexpr CErsCeosVariant CQORV_ERS_CEOS_VARIANTS[] = {
     {11474, 242, "ASF", 200},
 };
 
-/// Days since 1970 and seconds of the day from a CEOS time "YYYYMMDDhhmmss" followed by the
-/// digits of the fraction (three in the leaders: milliseconds).
-bool parseCeosTime(const std::string& theText, long& theDay, double& theSeconds)
-{
-    if (theText.size() < 14 || theText.find_first_not_of("0123456789") != std::string::npos) return false;
-    const auto number = [&](std::size_t thePos, std::size_t theCount) { return std::stoi(theText.substr(thePos, theCount)); };
-    const int aYear = number(0, 4), aMonth = number(4, 2), aDay = number(6, 2);
-    const int aHour = number(8, 2), aMinute = number(10, 2), aSecond = number(12, 2);
-    if (aYear < 1970 || aMonth < 1 || aMonth > 12 || aDay < 1 || aDay > 31 || aHour > 23 || aMinute > 59 || aSecond > 60)
-        return false;
-    double aFraction = 0.0;
-    double aScale = 0.1;
-    for (std::size_t i = 14; i < theText.size(); ++i, aScale *= 0.1) aFraction += (theText[i] - '0') * aScale;
-    theDay = fqorvDaysFromCivil(aYear, aMonth, aDay);
-    theSeconds = aHour * 3600.0 + aMinute * 60.0 + aSecond + aFraction;
-    return true;
-}
-
-[[noreturn]] void failValue(const CCeosFields& theRecord, int thePos, const std::string& theWhat, const std::string& theText)
-{
-    fqorvImportFail(CQORV_ERR_IMPORT_VALUE, theRecord.name() + ": " + theWhat + " at byte " + std::to_string(thePos) +
-                                                " is missing or not understood ('" + theText + "')");
-}
-
-int64_t requiredInteger(const CCeosFields& theRecord, int thePos, int theWidth, const std::string& theWhat)
-{
-    const std::optional<int64_t> aValue = theRecord.integer(thePos, theWidth);
-    if (!aValue) failValue(theRecord, thePos, theWhat, theRecord.text(thePos, theWidth));
-    return *aValue;
-}
-
-double requiredReal(const CCeosFields& theRecord, int thePos, int theWidth, const std::string& theWhat)
-{
-    const double aValue = theRecord.real(thePos, theWidth);
-    if (std::isnan(aValue)) failValue(theRecord, thePos, theWhat, theRecord.text(thePos, theWidth));
-    return aValue;
-}
-
 /// The two letters of the polarisation at the end of the sensor text ("SAR- C-HR-IM-VV").
 std::string polarisationOf(const std::string& theSensorText)
 {
@@ -89,17 +51,17 @@ void readDataSetSummary(const CCeosFields& theDss, CNativeArchive& theArchive)
     theArchive.mSensor = fqorvErsMission(aMission);
 
     // The clock: the binary time's count and its UTC give the reference of every time.
-    const int64_t aTicks = requiredInteger(theDss, 982, 16, "satellite binary time");
+    const int64_t aTicks = fqorvCeosRequiredInteger(theDss, 982, 16, "satellite binary time");
     const std::string aClockText = theDss.text(998, 32);
     long aDay = 0;
     double aSeconds = 0.0;
-    if (!parseCeosTime(aClockText, aDay, aSeconds)) failValue(theDss, 998, "UTC of the satellite binary time", aClockText);
+    if (!fqorvParseCeosTime(aClockText, aDay, aSeconds)) fqorvCeosFailValue(theDss, 998, "UTC of the satellite binary time", aClockText);
     theArchive.mReferenceDay = aDay;
     theArchive.mClock.mReferenceTicks = static_cast<uint32_t>(aTicks);
     theArchive.mClock.mReferenceTime = aSeconds;
     theArchive.mClock.mTickSeconds = NQORV_ERS::CLOCK_TICK;
 
-    if (parseCeosTime(theDss.text(68, 32), aDay, aSeconds))
+    if (fqorvParseCeosTime(theDss.text(68, 32), aDay, aSeconds))
         theArchive.mCentreTime = static_cast<double>(aDay - theArchive.mReferenceDay) * 86400.0 + aSeconds;
     theArchive.mCentreLatitude = theDss.real(116, 16);
     theArchive.mCentreLongitude = theDss.real(132, 16);
@@ -127,51 +89,10 @@ void readDataSetSummary(const CCeosFields& theDss, CNativeArchive& theArchive)
         theArchive.mNotes.push_back("the leader states no I/Q bias");
 }
 
-/// Earth-fixed frames are taken; an inertial frame would need a rotation the leader does not give.
-void checkFrame(const CCeosFields& thePpr, CNativeArchive& theArchive)
-{
-    std::string aFrame = thePpr.text(204, 64);
-    for (char& c : aFrame) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
-    const auto has = [&](const char* theWord) { return aFrame.find(theWord) != std::string::npos; };
-    if (has("INERTIAL") || has("ECI") || has("J2000") || has("EME2000") || has("MEAN OF") || has("TRUE OF"))
-        fqorvImportFail(CQORV_ERR_IMPORT_VALUE, thePpr.name() + ": the state vectors are in the inertial frame '" +
-                                                    thePpr.text(204, 64) + "'; Earth-fixed vectors are needed");
-    if (aFrame.empty()) {
-        theArchive.mNotes.push_back("the leader names no frame of its state vectors: taken as Earth-fixed");
-    } else if (!(has("ROTATING") || has("FIXED") || has("ECR") || has("ECEF") || has("GREENWICH") || has("ITRF"))) {
-        fqorvImportFail(CQORV_ERR_IMPORT_VALUE, thePpr.name() + ": the frame of the state vectors '" +
-                                                    thePpr.text(204, 64) + "' is not known as Earth-fixed");
-    }
-}
-
 /// The state vectors of the platform position record, timed from the reference day.
 void readPlatformPosition(const CCeosFields& thePpr, CNativeArchive& theArchive)
 {
-    const int64_t aCount = requiredInteger(thePpr, 140, 4, "number of state vectors");
-    if (aCount < 1) failValue(thePpr, 140, "number of state vectors", thePpr.text(140, 4));
-    const int aYear = static_cast<int>(requiredInteger(thePpr, 144, 4, "year of the state vectors"));
-    const int aMonth = static_cast<int>(requiredInteger(thePpr, 148, 4, "month of the state vectors"));
-    const int aDay = static_cast<int>(requiredInteger(thePpr, 152, 4, "day of the state vectors"));
-    if (aMonth < 1 || aMonth > 12 || aDay < 1 || aDay > 31) failValue(thePpr, 144, "date of the state vectors", thePpr.text(144, 12));
-    const double aFirst = requiredReal(thePpr, 160, 22, "time of the first state vector");
-    const double aInterval = requiredReal(thePpr, 182, 22, "interval of the state vectors");
-    if (aCount > 1 && !(aInterval > 0.0))
-        fqorvImportFail(CQORV_ERR_IMPORT_TIME_ORDER, thePpr.name() + ": the state vectors' interval is " +
-                                                         thePpr.text(182, 22) + " s, not increasing times");
-    checkFrame(thePpr, theArchive);
-
-    const double aDayStart = static_cast<double>(fqorvDaysFromCivil(aYear, aMonth, aDay) - theArchive.mReferenceDay) * 86400.0;
-    for (int64_t k = 0; k < aCount; ++k) {
-        const int aBase = 386 + 132 * static_cast<int>(k);
-        CStateVector aVector;
-        aVector.mTime = aDayStart + aFirst + static_cast<double>(k) * aInterval;
-        const std::string aWhat = "state vector " + std::to_string(k + 1);
-        for (int i = 0; i < 3; ++i) {
-            aVector.mPosition[i] = requiredReal(thePpr, aBase + 22 * i, 22, aWhat);
-            aVector.mVelocity[i] = requiredReal(thePpr, aBase + 66 + 22 * i, 22, aWhat);
-        }
-        theArchive.mStateVectors.push_back(aVector);
-    }
+    theArchive.mStateVectors = fqorvReadCeosPlatformPosition(thePpr, theArchive.mReferenceDay, theArchive.mNotes);
     theArchive.mStateVectorSource = "leader";
 }
 
@@ -202,11 +123,11 @@ void readDataFile(const std::filesystem::path& theData, CNativeArchive& theArchi
     if (aSampleType != "CI*2")
         fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT, aName + " holds samples of type '" + aSampleType + "' (" +
                                                             aFdr.text(400, 28) + "), not the raw 'CI*2' of ERS");
-    const int64_t aRecordLength = requiredInteger(aFdr, 186, 6, "record length");
+    const int64_t aRecordLength = fqorvCeosRequiredInteger(aFdr, 186, 6, "record length");
     const int64_t aLines = aFdr.integer(236, 8).value_or(0);   // blank: the whole records are taken
-    const int64_t aSamples = requiredInteger(aFdr, 248, 8, "samples per line");
+    const int64_t aSamples = fqorvCeosRequiredInteger(aFdr, 248, 8, "samples per line");
     // The stated prefix leaves out the record's 12-byte header.
-    const int64_t aRowPrefix = requiredInteger(aFdr, 276, 4, "prefix length") + CQORV_CEOS_HEADER_BYTES;
+    const int64_t aRowPrefix = fqorvCeosRequiredInteger(aFdr, 276, 4, "prefix length") + CQORV_CEOS_HEADER_BYTES;
     const int64_t aSuffix = aFdr.integer(288, 4).value_or(0);
     // A negative suffix would balance the sum below with lines longer than their records.
     if (aSuffix < 0)

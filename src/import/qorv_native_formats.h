@@ -23,8 +23,7 @@ bool fqorvReadAt(int theFd, uint64_t theOffset, void* theBuffer, std::size_t the
 /// "ERS-1" or "ERS-2" for a mission text ("ERS2", "ERS-2", "E2", ...), "" for any other.
 std::string fqorvErsMission(const std::string& theMission);
 
-/// Refuses a mission other than ERS-1/2 (for a CEOS mission text): ALOS is named as not imported
-/// yet (979201), any other fails with theId and theWords.
+/// Refuses a mission other than ERS-1/2 (for a CEOS mission text): fails with theId and theWords.
 void fqorvRefuseOtherMission(const std::string& theMission, int theId, const std::string& theWords);
 
 /// Sets the positions of the auxiliary block from the image format counter's: every ERS layout
@@ -54,7 +53,7 @@ enum class ENativeFileKind {
 
 struct CNativeFileClass {
     ENativeFileKind mKind = ENativeFileKind::Other;
-    std::string mMission;   // CEOS leader: the mission text of its data set summary
+    std::string mMission;   // CEOS leader: the mission text of its data set summary; "ALOS" for an ALOS image file
     std::string mWhat;      // what the file seems to be, in words for a refusal
 };
 

@@ -78,7 +78,6 @@ std::string fqorvErsMission(const std::string& theMission)
 void fqorvRefuseOtherMission(const std::string& theMission, int theId, const std::string& theWords)
 {
     if (!fqorvErsMission(theMission).empty()) return;
-    if (theMission.rfind("ALOS", 0) == 0) fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT, "ALOS PALSAR level 1.0 is not imported yet");
     fqorvImportFail(theId, theWords);
 }
 
@@ -197,6 +196,28 @@ void fqorvCheckStatedValues(const CNativeArchive& theArchive)
 // ---------------------------------------------------------------------------------------------
 // Recognition
 
+namespace {
+
+/// Bytes of a signal record's start that tell an ALOS image file.
+constexpr std::size_t CQORV_ALOS_SIGNAL_HEAD = 60;
+
+/// An ALOS signal record states binary values that ERS records do not hold at these places: its
+/// data and right-fill pixels (24, 28) fill its length after a 412-byte prefix, and its year (36),
+/// day of the year (40), millisecond of the day (44) and PRF in mHz (56) are those of a line. ERS
+/// records hold blanks, zeros or a pixel count without a date there.
+bool isAlosSignalRecord(const std::vector<uint8_t>& theHead)
+{
+    if (theHead.size() < CQORV_ALOS_SIGNAL_HEAD) return false;
+    const auto u32 = [&](std::size_t thePos) { return static_cast<uint64_t>(fqorvBigEndianU32(theHead.data() + thePos)); };
+    const uint64_t aYear = u32(36), aDay = u32(40), aMs = u32(44), aPrf = u32(56);
+    return 412 + 2 * (u32(24) + u32(28)) == u32(8) && u32(24) > 0 && aYear >= 1990 && aYear <= 2100 && aDay >= 1 &&
+           aDay <= 366 && aMs < 86400000 && aPrf >= 100000 && aPrf <= 100000000;
+}
+
+bool isAlos(const CNativeFileClass& theClass) { return theClass.mMission.rfind("ALOS", 0) == 0; }
+
+}  // namespace
+
 CNativeFileClass fqorvClassifyNativeFile(const fs::path& theFile)
 {
     CNativeFileClass aClass;
@@ -221,13 +242,17 @@ CNativeFileClass fqorvClassifyNativeFile(const fs::path& theFile)
         return aClass;
     }
 
-    // A data file: its descriptor is followed by signal data records.
-    const std::vector<uint8_t> aSecond = fqorvReadFileBytes(theFile, aFirst.mLength, CQORV_CEOS_HEADER_BYTES);
-    if (aSecond.size() == CQORV_CEOS_HEADER_BYTES) {
+    // A data file: its descriptor is followed by signal data records (kind 50).
+    const std::vector<uint8_t> aSecond = fqorvReadFileBytes(theFile, aFirst.mLength, CQORV_ALOS_SIGNAL_HEAD);
+    if (aSecond.size() >= CQORV_CEOS_HEADER_BYTES) {
         const CCeosRecord aRecord = fqorvCeosRecordHeader(aSecond.data(), aFirst.mLength);
         if (aRecord.mSequence == 2 && aRecord.mType[0] == 50) {
             aClass.mKind = ENativeFileKind::CeosData;
             aClass.mWhat = "a CEOS data file";
+            if (isAlosSignalRecord(aSecond)) {
+                aClass.mMission = "ALOS";
+                aClass.mWhat = "an ALOS PALSAR image file";
+            }
             return aClass;
         }
     }
@@ -250,12 +275,12 @@ CNativeFileClass fqorvClassifyNativeFile(const fs::path& theFile)
 
 namespace {
 
-/// Refuses a CEOS leader given (or alone in a directory) of another mission than ERS.
+/// Refuses a CEOS leader given (or alone in a directory) of another mission than ERS or ALOS.
 void refuseOtherMission(const CNativeFileClass& theLeader, const fs::path& theFile)
 {
     fqorvRefuseOtherMission(theLeader.mMission, CQORV_ERR_IMPORT_UNKNOWN_INPUT,
                             theFile.string() + " is a CEOS leader of the mission '" + theLeader.mMission +
-                                "': only ERS-1/2 CEOS raw products are imported");
+                                "': only ERS-1/2 and ALOS PALSAR CEOS products are imported");
 }
 
 struct CClassifiedFile {
@@ -287,6 +312,13 @@ std::vector<const CClassifiedFile*> ofKind(const std::vector<CClassifiedFile>& t
     return aFound;
 }
 
+/// The ALOS files of theFiles (theAlos), or the others.
+std::vector<const CClassifiedFile*> ofAlos(std::vector<const CClassifiedFile*> theFiles, bool theAlos)
+{
+    std::erase_if(theFiles, [theAlos](const CClassifiedFile* theFile) { return isAlos(theFile->mClass) != theAlos; });
+    return theFiles;
+}
+
 std::string namesOf(const std::vector<const CClassifiedFile*>& theFiles)
 {
     std::string aNames;
@@ -294,7 +326,7 @@ std::string namesOf(const std::vector<const CClassifiedFile*>& theFiles)
     return aNames;
 }
 
-/// The ERS leader among theCandidates for theData; an ALOS leader names ALOS, anything else is 979202.
+/// The ERS leader among theCandidates for theData; anything else is 979202.
 fs::path leaderFor(const fs::path& theData, const std::vector<CClassifiedFile>& theCandidates)
 {
     const std::vector<const CClassifiedFile*> aLeaders = ofKind(theCandidates, ENativeFileKind::CeosLeader);
@@ -313,19 +345,116 @@ fs::path leaderFor(const fs::path& theData, const std::vector<CClassifiedFile>& 
                                                  (aOthers.empty() ? std::string() : " (other CEOS files: " + namesOf(aOthers) + ")"));
 }
 
-/// The one CEOS data file among theCandidates (261122 when there is none).
+/// The one ERS CEOS data file among theCandidates (261122 when there is none).
 fs::path dataFileAmong(const std::vector<CClassifiedFile>& theCandidates, const std::string& theWhere)
 {
-    const std::vector<const CClassifiedFile*> aData = ofKind(theCandidates, ENativeFileKind::CeosData);
+    const std::vector<const CClassifiedFile*> aData = ofAlos(ofKind(theCandidates, ENativeFileKind::CeosData), false);
     if (aData.empty()) fqorvImportFail(CQORV_ERR_MISSING_FILE, "no CEOS data file " + theWhere);
     if (aData.size() > 1)
         fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT, "several CEOS data files " + theWhere + ": " + namesOf(aData) + "; name one");
     return aData.front()->mPath;
 }
 
+fs::path directoryOf(const fs::path& theFile)
+{
+    return theFile.has_parent_path() ? theFile.parent_path() : fs::path(".");
+}
+
+// ---- ALOS: one leader, one image file per polarisation ----------------------------------------
+
+/// The scene identity of an ALOS file name: what follows "LED-" or "IMG-XX-"; "" for other names.
+std::string alosSceneOf(const fs::path& theFile)
+{
+    const std::string aName = theFile.filename().string();
+    if (aName.rfind("LED-", 0) == 0) return aName.substr(4);
+    if (aName.rfind("IMG-", 0) == 0 && aName.size() > 7 && aName[6] == '-') return aName.substr(7);
+    return "";
+}
+
+struct CAlosFiles {
+    fs::path mLeader;                 // empty: not an ALOS product
+    std::vector<fs::path> mImages;    // in the order of their names (IMG-HH, IMG-HV, IMG-VH, IMG-VV)
+};
+
+/// The ALOS leader beside theImage among theCandidates: the only one, or the one of the image's
+/// scene; 979202 when there is none.
+fs::path alosLeaderFor(const fs::path& theImage, const std::vector<CClassifiedFile>& theCandidates)
+{
+    const std::vector<const CClassifiedFile*> aLeaders = ofAlos(ofKind(theCandidates, ENativeFileKind::CeosLeader), true);
+    if (aLeaders.size() == 1) return aLeaders.front()->mPath;
+    if (aLeaders.empty()) fqorvImportFail(CQORV_ERR_IMPORT_LEADER, "no ALOS leader beside " + theImage.string());
+    for (const CClassifiedFile* aLeader : aLeaders)
+        if (!alosSceneOf(theImage).empty() && alosSceneOf(aLeader->mPath) == alosSceneOf(theImage)) return aLeader->mPath;
+    fqorvImportFail(CQORV_ERR_IMPORT_LEADER, "several ALOS leaders beside " + theImage.string() + ": " + namesOf(aLeaders));
+}
+
+/// The ALOS image files of theLeader among theCandidates: those of its scene when the names tell
+/// it, else all; 261122 when there is none.
+std::vector<fs::path> alosImagesOf(const fs::path& theLeader, const std::vector<CClassifiedFile>& theCandidates)
+{
+    const std::vector<const CClassifiedFile*> aAll = ofAlos(ofKind(theCandidates, ENativeFileKind::CeosData), true);
+    std::vector<fs::path> aImages, aOfScene;
+    for (const CClassifiedFile* aImage : aAll) {
+        aImages.push_back(aImage->mPath);
+        if (!alosSceneOf(theLeader).empty() && alosSceneOf(aImage->mPath) == alosSceneOf(theLeader)) aOfScene.push_back(aImage->mPath);
+    }
+    if (aImages.empty()) fqorvImportFail(CQORV_ERR_MISSING_FILE, "no ALOS image file beside " + theLeader.string());
+    return aOfScene.empty() ? aImages : aOfScene;
+}
+
+/// A directory is an ALOS product when it holds an ALOS leader or image file and no ERS data file.
+bool isAlosDirectory(const std::vector<CClassifiedFile>& theFiles)
+{
+    const std::vector<const CClassifiedFile*> aData = ofKind(theFiles, ENativeFileKind::CeosData);
+    const bool aAlos = !ofAlos(aData, true).empty() || !ofAlos(ofKind(theFiles, ENativeFileKind::CeosLeader), true).empty();
+    return aAlos && ofAlos(aData, false).empty();
+}
+
+CAlosFiles alosFilesOfDirectory(const fs::path& theDirectory, const std::vector<CClassifiedFile>& theFiles)
+{
+    const std::vector<const CClassifiedFile*> aLeaders = ofAlos(ofKind(theFiles, ENativeFileKind::CeosLeader), true);
+    if (aLeaders.empty()) {
+        const std::vector<const CClassifiedFile*> aImages = ofAlos(ofKind(theFiles, ENativeFileKind::CeosData), true);
+        fqorvImportFail(CQORV_ERR_IMPORT_LEADER, "no ALOS leader beside " + aImages.front()->mPath.string());
+    }
+    if (aLeaders.size() > 1)
+        fqorvImportFail(CQORV_ERR_IMPORT_LEADER, "several ALOS leaders in " + theDirectory.string() + ": " + namesOf(aLeaders) +
+                                                     "; name a leader or an image file");
+    return {aLeaders.front()->mPath, alosImagesOf(aLeaders.front()->mPath, theFiles)};
+}
+
+/// The ALOS product theInput names (a directory, a leader or an image file); an empty leader when
+/// it is none.
+CAlosFiles alosFilesOf(const fs::path& theInput)
+{
+    std::error_code aError;
+    if (fs::is_directory(theInput, aError)) {
+        const std::vector<CClassifiedFile> aFiles = classifyDirectory(theInput);
+        return isAlosDirectory(aFiles) ? alosFilesOfDirectory(theInput, aFiles) : CAlosFiles{};
+    }
+    const CNativeFileClass aClass = fqorvClassifyNativeFile(theInput);
+    if (!isAlos(aClass)) return {};
+    const std::vector<CClassifiedFile> aBeside = classifyDirectory(directoryOf(theInput), theInput);
+    if (aClass.mKind == ENativeFileKind::CeosLeader) return {theInput, alosImagesOf(theInput, aBeside)};
+    return {alosLeaderFor(theInput, aBeside), {theInput}};
+}
+
+/// The one product of an ALOS input; an input of several polarisations is 979201.
+CNativeArchive readOneAlos(const CAlosFiles& theFiles, const fs::path& theInput)
+{
+    if (theFiles.mImages.size() > 1) {
+        std::string aNames;
+        for (const fs::path& aImage : theFiles.mImages) aNames += (aNames.empty() ? "" : ", ") + aImage.filename().string();
+        fqorvImportFail(CQORV_ERR_IMPORT_UNKNOWN_INPUT, theInput.string() + " holds the ALOS image files " + aNames +
+                                                            ", one product each: name one image file");
+    }
+    return fqorvReadAlosCeos(theFiles.mLeader, theFiles.mImages.front());
+}
+
 CNativeArchive readDirectory(const fs::path& theDirectory)
 {
     const std::vector<CClassifiedFile> aFiles = classifyDirectory(theDirectory);
+    if (isAlosDirectory(aFiles)) return readOneAlos(alosFilesOfDirectory(theDirectory, aFiles), theDirectory);
     const std::vector<const CClassifiedFile*> aLeaders = ofKind(aFiles, ENativeFileKind::CeosLeader);
     const bool aErsLeader = std::any_of(aLeaders.begin(), aLeaders.end(), [](const CClassifiedFile* theLeader) {
         return !fqorvErsMission(theLeader->mClass.mMission).empty();
@@ -343,9 +472,13 @@ CNativeArchive readDirectory(const fs::path& theDirectory)
     return fqorvReadErsCeos(leaderFor(aDataFile, aFiles), aDataFile);
 }
 
-fs::path directoryOf(const fs::path& theFile)
+/// Polarisations in the order the products of an ALOS input are given.
+int polarisationRank(const std::string& thePolarisation)
 {
-    return theFile.has_parent_path() ? theFile.parent_path() : fs::path(".");
+    static const char* const aOrder[] = {"HH", "HV", "VH", "VV"};
+    for (int i = 0; i < 4; ++i)
+        if (thePolarisation == aOrder[i]) return i;
+    return 4;
 }
 
 }  // namespace
@@ -365,12 +498,20 @@ CNativeArchive fqorvReadNativeArchive(const fs::path& theInput, const CNativeOut
             (void)theOutside;
             break;
         case ENativeFileKind::CeosLeader: {
+            if (isAlos(aClass)) {
+                aArchive = readOneAlos({theInput, alosImagesOf(theInput, classifyDirectory(directoryOf(theInput), theInput))}, theInput);
+                break;
+            }
             refuseOtherMission(aClass, theInput);
             const fs::path aData = dataFileAmong(classifyDirectory(directoryOf(theInput), theInput), "beside " + theInput.string());
             aArchive = fqorvReadErsCeos(theInput, aData);
             break;
         }
         case ENativeFileKind::CeosData:
+            if (isAlos(aClass)) {
+                aArchive = fqorvReadAlosCeos(alosLeaderFor(theInput, classifyDirectory(directoryOf(theInput), theInput)), theInput);
+                break;
+            }
             aArchive = fqorvReadErsCeos(leaderFor(theInput, classifyDirectory(directoryOf(theInput), theInput)), theInput);
             break;
         case ENativeFileKind::CeosOther:
@@ -384,8 +525,18 @@ CNativeArchive fqorvReadNativeArchive(const fs::path& theInput, const CNativeOut
 
 std::vector<CNativeArchive> fqorvReadNativeArchives(const fs::path& theInput, const CNativeOutsideFiles& theOutside)
 {
+    std::error_code aError;
+    if (!fs::exists(theInput, aError)) fqorvImportFail(CQORV_ERR_MISSING_FILE, theInput.string() + " does not exist");
+    const CAlosFiles aAlos = alosFilesOf(theInput);
+    if (aAlos.mLeader.empty()) return {fqorvReadNativeArchive(theInput, theOutside)};
     std::vector<CNativeArchive> aArchives;
-    aArchives.push_back(fqorvReadNativeArchive(theInput, theOutside));
+    for (const fs::path& aImage : aAlos.mImages) {
+        aArchives.push_back(fqorvReadAlosCeos(aAlos.mLeader, aImage));
+        aArchives.back().mSource = theInput;
+    }
+    std::stable_sort(aArchives.begin(), aArchives.end(), [](const CNativeArchive& a, const CNativeArchive& b) {
+        return polarisationRank(a.mPolarisation) < polarisationRank(b.mPolarisation);
+    });
     return aArchives;
 }
 

@@ -1,10 +1,11 @@
-// The readers of native ERS raw archives: recognition by content, the descriptors and headers of
+// The readers of native raw archives: recognition by content, the descriptors and headers of
 // each format into a CNativeArchive, and the line records of the data file, walked by their own
 // length fields.
 //
 // Formats: ERS CEOS (a leader file and a data file, several facilities' variants of the record
 // layout) and ERS level 0 in the ENVISAT format (.E1/.E2: main and specific product headers, data
-// set descriptors, one data set record per line).
+// set descriptors, one data set record per line), ALOS PALSAR level 1.0 CEOS (a leader and one
+// image file per polarisation).
 #pragma once
 
 #include <cstddef>
@@ -25,17 +26,20 @@ struct CNativeOutsideFiles {
 /// Recognises theInput by its content (a CEOS product directory, its data or its leader file, or
 /// an ENVISAT-format file; the names do not matter) and reads its headers. Throws CImportFailure:
 /// 261122 when theInput does not exist, 979201 for anything that is not one of the formats (with
-/// the words of what it seems to be: ENVISAT ASAR or ALOS PALSAR are named as not imported yet),
-/// 979202 for a CEOS data file without an ERS leader beside it, 979203 for record lengths that
+/// the words of what it seems to be) and for an ALOS input of several image files (name one, or
+/// read them all with fqorvReadNativeArchives), 979202 for a CEOS data file without an ERS
+/// leader beside it or an ALOS image file without an ALOS leader, 979203 for record lengths that
 /// contradict the file descriptor, 979204 for a record layout of no known facility, 979206 for
 /// state vectors whose times go backwards, 979210 for a missing or impossible value.
 /// theOutside: the outside files given (an ASAR product needs its instrument file: 979212 when
 /// none is given or found beside it, 979213 for a file of another kind or size).
 CNativeArchive fqorvReadNativeArchive(const std::filesystem::path& theInput, const CNativeOutsideFiles& theOutside = {});
 
-/// Every archive theInput holds: one for an ERS or ASAR input or an ALOS image file, one per ALOS
-/// image file (polarisation) for an ALOS leader or product directory. Failures as above.
-std::vector<CNativeArchive> fqorvReadNativeArchives(const std::filesystem::path& theInput, const CNativeOutsideFiles& theOutside = {});
+/// Every product theInput holds: one for an ERS or ENVISAT-format input or an ALOS image file;
+/// one per image file (polarisation), in the order HH, HV, VH, VV, for an ALOS leader or product
+/// directory. Failures as fqorvReadNativeArchive.
+std::vector<CNativeArchive> fqorvReadNativeArchives(const std::filesystem::path& theInput,
+                                                    const CNativeOutsideFiles& theOutside = {});
 
 /// The line records of an archive's data file, opened read-only.
 class CNativeRecordFile {

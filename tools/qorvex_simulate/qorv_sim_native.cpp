@@ -7,6 +7,7 @@
 #include <system_error>
 
 #include "qorv_json.h"
+#include "qorv_sim_ceos.h"
 #include "qorv_sim_format.h"
 #include "qorv_sim_geodesy.h"
 #include "qorv_sim_orbit.h"
@@ -18,119 +19,20 @@ namespace fs = std::filesystem;
 
 namespace {
 
+using namespace NQORV_SIM_CEOS;
+
 // ------------------------------------------------------------------------------------------------
-// CEOS records and their text fields
+// CEOS records
 
 constexpr CSimCeosVariant CQORV_SIM_CEOS_VARIANTS[] = {
     {"PGS/VMP", 11644, 412, 210}, {"CO", 11644, 416, 214}, {"EIC", 11644, 410, 198},
     {"CCRS", 12060, 412, 200},    {"ASF", 11474, 242, 200},
 };
 
-constexpr int CQORV_SIM_RECORD_HEADER = 12;
 constexpr int CQORV_SIM_LEADER_FDR = 720;
 constexpr int CQORV_SIM_DSS = 1886;
 constexpr int CQORV_SIM_FACILITY = 12288;
 constexpr int CQORV_SIM_VOLUME_RECORD = 360;
-constexpr int CQORV_SIM_VECTOR_BASE = 386;    // first state vector of the platform position record
-constexpr int CQORV_SIM_VECTOR_SIZE = 132;    // six F22 fields
-
-using CRecord = std::vector<uint8_t>;
-
-/// A record of theLength bytes: its 12-byte header, the rest blank (CEOS text records) or zero.
-CRecord ceosRecord(uint32_t theSequence, const uint8_t (&theTypes)[4], uint32_t theLength, bool theBlank)
-{
-    CRecord r(theLength, theBlank ? ' ' : 0);
-    fqorvSimPutBE32(r.data(), theSequence);
-    std::memcpy(r.data() + 4, theTypes, 4);
-    fqorvSimPutBE32(r.data() + 8, theLength);
-    return r;
-}
-
-/// An field: text left-justified, blank padded.
-void putA(CRecord& r, int theOffset, int theWidth, const std::string& theText)
-{
-    if (static_cast<int>(theText.size()) > theWidth || theOffset + theWidth > static_cast<int>(r.size()))
-        throw std::runtime_error("the CEOS field at " + std::to_string(theOffset) + " cannot hold \"" + theText + "\"");
-    std::memset(r.data() + theOffset, ' ', static_cast<std::size_t>(theWidth));
-    std::memcpy(r.data() + theOffset, theText.data(), theText.size());
-}
-
-/// Right-justified in theWidth characters.
-void putRight(CRecord& r, int theOffset, int theWidth, const std::string& theText)
-{
-    if (static_cast<int>(theText.size()) > theWidth)
-        throw std::runtime_error("the CEOS field at " + std::to_string(theOffset) + " cannot hold " + theText);
-    putA(r, theOffset, theWidth, std::string(static_cast<std::size_t>(theWidth) - theText.size(), ' ') + theText);
-}
-
-/// In field.
-void putI(CRecord& r, int theOffset, int theWidth, long long theValue)
-{
-    putRight(r, theOffset, theWidth, std::to_string(theValue));
-}
-
-/// Fn field: fixed notation with as many decimals (up to theMaxDecimals) as the width holds; NaN
-/// writes theFiller, by default "-9999999.9" (as many nines as fit a narrower field).
-void putF(CRecord& r, int theOffset, int theWidth, double theValue, const char* theFiller = nullptr,
-          int theMaxDecimals = 15)
-{
-    if (std::isnan(theValue)) {
-        const std::string aNines(static_cast<std::size_t>(std::min(7, theWidth - 3)), '9');
-        putRight(r, theOffset, theWidth, theFiller ? theFiller : "-" + aNines + ".9");
-        return;
-    }
-    char aText[64];
-    for (int d = theMaxDecimals; d >= 0; --d) {
-        std::snprintf(aText, sizeof aText, "%.*f", d, theValue);
-        if (static_cast<int>(std::strlen(aText)) <= theWidth) {
-            putRight(r, theOffset, theWidth, aText);
-            return;
-        }
-    }
-    throw std::runtime_error("the CEOS field at " + std::to_string(theOffset) + " cannot hold " + std::to_string(theValue));
-}
-
-/// Civil date and time of a time in seconds from the midnight of theDay, rounded to theUnit
-/// (1e-3: ms, 1e-6: us); the fraction is returned in that unit.
-struct CCivilTime {
-    int mYear, mMonth, mDay, mHour, mMinute, mSecond;
-    long mFraction;
-    int mDayOfYear;
-    long mDayNumber;     // days since 1970-01-01
-    long mSecondOfDay;
-};
-
-CCivilTime civilTime(long theDay, double theSeconds, double theUnit)
-{
-    const long long aPerDay = std::llround(86400.0 / theUnit);
-    const long long aPerSecond = std::llround(1.0 / theUnit);
-    const long long aUnits = std::llround(theSeconds / theUnit);
-    long long aDays = aUnits / aPerDay, aRest = aUnits % aPerDay;
-    if (aRest < 0) {
-        aRest += aPerDay;
-        --aDays;
-    }
-    CCivilTime c{};
-    c.mDayNumber = theDay + static_cast<long>(aDays);
-    fqorvSimCivilFromDays(c.mDayNumber, c.mYear, c.mMonth, c.mDay);
-    c.mDayOfYear = static_cast<int>(c.mDayNumber - fqorvSimDaysFromCivil(c.mYear, 1, 1)) + 1;
-    c.mSecondOfDay = static_cast<long>(aRest / aPerSecond);
-    c.mFraction = static_cast<long>(aRest % aPerSecond);
-    c.mHour = static_cast<int>(c.mSecondOfDay / 3600);
-    c.mMinute = static_cast<int>(c.mSecondOfDay / 60 % 60);
-    c.mSecond = static_cast<int>(c.mSecondOfDay % 60);
-    return c;
-}
-
-/// "YYYYMMDDhhmmssttt": the leader's time text, to the millisecond.
-std::string ceosTime(long theDay, double theSeconds)
-{
-    const CCivilTime c = civilTime(theDay, theSeconds, 1e-3);
-    char aText[32];
-    std::snprintf(aText, sizeof aText, "%04d%02d%02d%02d%02d%02d%03ld", c.mYear, c.mMonth, c.mDay, c.mHour, c.mMinute,
-                  c.mSecond, c.mFraction);
-    return aText;
-}
 
 /// "DD-MMM-YYYY hh:mm:ss.uuuuuu": the ENVISAT format's date text.
 std::string envisatDate(long theDay, double theSeconds)
@@ -145,65 +47,6 @@ std::string envisatDate(long theDay, double theSeconds)
 }
 
 bool isErs1(const CSimNativeProduct& p) { return p.mSensor == "ERS-1"; }
-
-// ------------------------------------------------------------------------------------------------
-// Files written under "<name>.part"
-
-/// A file written from the start, with fields patched in place at the end.
-class CPartFile {
-public:
-    explicit CPartFile(const fs::path& thePath) : mPath(thePath)
-    {
-        mFile = std::fopen(thePath.c_str(), "wb");
-        if (!mFile) throw std::runtime_error("cannot create " + thePath.string());
-        // A small buffer stays in the processor's cache, where the kernel copies it from fast; a
-        // buffer of megabytes made the copy into the page cache cost half a second per frame.
-        mBuffer.resize(std::size_t{1} << 16);
-        std::setvbuf(mFile, mBuffer.data(), _IOFBF, mBuffer.size());
-    }
-    ~CPartFile()
-    {
-        if (mFile) std::fclose(mFile);
-    }
-    CPartFile(const CPartFile&) = delete;
-    CPartFile& operator=(const CPartFile&) = delete;
-
-    void append(const uint8_t* theData, std::size_t theSize)
-    {
-        if (std::fwrite(theData, 1, theSize, mFile) != theSize) fail();
-    }
-    void append(const CRecord& r) { append(r.data(), r.size()); }
-    void append(const std::string& s) { append(reinterpret_cast<const uint8_t*>(s.data()), s.size()); }
-    /// Overwrites bytes already written at theOffset.
-    void patch(long theOffset, const uint8_t* theData, std::size_t theSize)
-    {
-        if (std::fflush(mFile) != 0 || fseeko(mFile, theOffset, SEEK_SET) != 0) fail();
-        append(theData, theSize);
-        if (std::fflush(mFile) != 0 || fseeko(mFile, 0, SEEK_END) != 0) fail();
-    }
-    void patch(long theOffset, const std::string& s) { patch(theOffset, reinterpret_cast<const uint8_t*>(s.data()), s.size()); }
-    void close()
-    {
-        const int aStatus = std::fclose(mFile);
-        mFile = nullptr;
-        if (aStatus != 0) fail();
-    }
-
-private:
-    [[noreturn]] void fail() { throw std::runtime_error("cannot write " + mPath.string()); }
-    fs::path mPath;
-    std::FILE* mFile = nullptr;
-    std::vector<char> mBuffer;
-};
-
-void writeWhole(const fs::path& thePath, const std::vector<CRecord>& theRecords)
-{
-    CPartFile f(thePath);
-    for (const CRecord& r : theRecords) f.append(r);
-    f.close();
-}
-
-fs::path partOf(const fs::path& thePath) { return fs::path(thePath.string() + ".part"); }
 
 // ------------------------------------------------------------------------------------------------
 // ERS CEOS
@@ -223,28 +66,7 @@ const char* const CQORV_SIM_CEOS_FILES[4] = {"VDF_DAT.001", "LEA_01.001", "DAT_0
 uint32_t platformRecordLength(const CSimNativeProduct& p)
 {
     const std::size_t n = std::max<std::size_t>(5, p.mStateVectors.size());
-    return static_cast<uint32_t>(CQORV_SIM_VECTOR_BASE + CQORV_SIM_VECTOR_SIZE * n);
-}
-
-/// The common head of a file descriptor record.
-void putDescriptorHead(CRecord& r, const char* theFileName)
-{
-    putA(r, 12, 2, "A");
-    putA(r, 16, 12, "CEOS-SAR-CCT");
-    putA(r, 28, 2, "A");
-    putA(r, 30, 2, "A");
-    putA(r, 32, 12, "QORVEX-SIM");
-    putI(r, 44, 4, 1);
-    putA(r, 48, 16, theFileName);
-    putA(r, 64, 4, "FSEQ");
-    putI(r, 68, 8, 1);
-    putI(r, 76, 4, 4);
-    putA(r, 80, 4, "FTYP");
-    putI(r, 84, 8, 5);
-    putI(r, 92, 4, 4);
-    putA(r, 96, 4, "FLGT");
-    putI(r, 100, 8, 9);
-    putI(r, 108, 4, 4);
+    return static_cast<uint32_t>(VECTOR_BASE + VECTOR_SIZE * n);
 }
 
 CRecord leaderDescriptor(const CSimNativeProduct& p)
@@ -293,30 +115,6 @@ CRecord dataSetSummary(const CSimNativeProduct& p)
     putA(r, 998, 32, std::isnan(p.mClock.mReferenceTime) ? "" : ceosTime(p.mReferenceDay, p.mClock.mReferenceTime));
     putA(r, 1046, 16, p.mFacility);
     putA(r, 1062, 8, p.mProcessor);
-    return r;
-}
-
-CRecord platformPosition(const CSimNativeProduct& p)
-{
-    const std::vector<CStateVector>& v = p.mStateVectors;
-    CRecord r = ceosRecord(3, CQORV_SIM_PLATFORM_TYPES, platformRecordLength(p), true);
-    const CCivilTime c = civilTime(p.mReferenceDay, v.front().mTime, 1e-6);
-    putI(r, 140, 4, static_cast<long long>(v.size()));
-    putI(r, 144, 4, c.mYear);
-    putI(r, 148, 4, c.mMonth);
-    putI(r, 152, 4, c.mDay);
-    putI(r, 156, 4, c.mDayOfYear);
-    // Seconds of the day of the first vector, whose date stands above.
-    putF(r, 160, 22, v.front().mTime - 86400.0 * static_cast<double>(c.mDayNumber - p.mReferenceDay), "", 9);
-    putF(r, 182, 22, v[1].mTime - v[0].mTime, "", 9);
-    putA(r, 204, 64, "Earth Centred Rotating");
-    for (std::size_t k = 0; k < v.size(); ++k) {
-        const int aAt = CQORV_SIM_VECTOR_BASE + CQORV_SIM_VECTOR_SIZE * static_cast<int>(k);
-        for (int i = 0; i < 3; ++i) {
-            putF(r, aAt + 22 * i, 22, v[k].mPosition[i], "", 9);
-            putF(r, aAt + 66 + 22 * i, 22, v[k].mVelocity[i], "", 9);
-        }
-    }
     return r;
 }
 
@@ -370,7 +168,7 @@ CRecord dataDescriptor(const CSimNativeProduct& p, const CSimCeosVariant& v, lon
     putA(r, 268, 4, "BSQ");
     putI(r, 272, 2, 1);
     putI(r, 274, 2, 1);
-    putI(r, 276, 4, v.mPrefix - CQORV_SIM_RECORD_HEADER);
+    putI(r, 276, 4, v.mPrefix - RECORD_HEADER);
     putI(r, 280, 8, 2LL * p.mSamples);
     putI(r, 288, 4, static_cast<long long>(v.mRecordLength) - v.mPrefix - 2LL * p.mSamples);
     putA(r, 400, 28, "COMPLEX UNSIGNED INTEGER");
@@ -453,7 +251,8 @@ private:
     {
         writeWhole(mPart / CQORV_SIM_CEOS_FILES[0], volumeDirectory(mProduct));
         writeWhole(mPart / CQORV_SIM_CEOS_FILES[1],
-                   {leaderDescriptor(mProduct), dataSetSummary(mProduct), platformPosition(mProduct),
+                   {leaderDescriptor(mProduct), dataSetSummary(mProduct),
+                    platformPosition(3, CQORV_SIM_PLATFORM_TYPES, mProduct.mReferenceDay, mProduct.mStateVectors, 5),
                     ceosRecord(4, CQORV_SIM_FACILITY_TYPES, CQORV_SIM_FACILITY, true),
                     ceosRecord(5, CQORV_SIM_FACILITY_TYPES, CQORV_SIM_FACILITY, true)});
         writeWhole(mPart / CQORV_SIM_CEOS_FILES[3], nullVolume());
@@ -808,21 +607,6 @@ uint32_t fieldOf(const CSimNativeLine& l, CSimGarbageField theField)
     return 0;
 }
 
-CJson vectorsJson(const CSimScene& s, const std::vector<CStateVector>& theVectors, const std::string& theSource)
-{
-    CJson aTimes = CJson::array(), aPos = CJson::array(), aVel = CJson::array();
-    for (const CStateVector& v : theVectors) {
-        aTimes.push(CJson(sceneTime(s, v.mTime)));
-        aPos.push(CJson(std::vector<double>{v.mPosition[0], v.mPosition[1], v.mPosition[2]}));
-        aVel.push(CJson(std::vector<double>{v.mVelocity[0], v.mVelocity[1], v.mVelocity[2]}));
-    }
-    CJson j = CJson::object();
-    j["source"] = theSource;
-    j["times"] = aTimes;
-    j["pos"] = aPos;
-    j["vel"] = aVel;
-    return j;
-}
 
 }  // namespace
 
@@ -926,7 +710,7 @@ void fqorvSimAddArchiveTruth(CJson& theTruth, const CSimScene& s, const CSimTime
     w["delay_bias"] = NQORV_ERS::DELAY_BIAS;
     w["swst_unit"] = NQORV_ERS::SWST_SAMPLES_PER_CODE / s.mRadar.mSamplingRate;
     w["definition"] = "tau = swst_code * swst_unit + rank / PRF - delay_bias";
-    a["state_vectors"] = vectorsJson(s, p.mStateVectors, aCeos ? "leader" : "main product header (FP)");
+    a["state_vectors"] = fqorvSimVectorsJson(p.mStateVectors, s.mEpoch.mSeconds, aCeos ? "leader" : "main product header (FP)");
     theTruth["archive"] = a;
     theTruth["raster"]["file"] = theArchive.filename().string();
     theTruth["raster"]["header"] = CJson();
@@ -956,4 +740,20 @@ CStateVector fqorvSimStateVector(const CSimState& theState, double theTime)
         v.mVelocity[i] = aVel[i];
     }
     return v;
+}
+
+CJson fqorvSimVectorsJson(const std::vector<CStateVector>& theVectors, double theOffset, const std::string& theSource)
+{
+    CJson aTimes = CJson::array(), aPos = CJson::array(), aVel = CJson::array();
+    for (const CStateVector& v : theVectors) {
+        aTimes.push(CJson(v.mTime - theOffset));
+        aPos.push(CJson(std::vector<double>{v.mPosition[0], v.mPosition[1], v.mPosition[2]}));
+        aVel.push(CJson(std::vector<double>{v.mVelocity[0], v.mVelocity[1], v.mVelocity[2]}));
+    }
+    CJson j = CJson::object();
+    j["source"] = theSource;
+    j["times"] = aTimes;
+    j["pos"] = aPos;
+    j["vel"] = aVel;
+    return j;
 }

@@ -80,6 +80,8 @@
 #include "qorv_native_archive.h"
 #include "qorv_sim_orbit.h"
 
+class CJson;
+
 /// The record layouts of the ERS CEOS data file of the processing facilities.
 enum class CSimCeosLayout { PgsVmp, Co, Eic, Ccrs, Asf };
 
@@ -209,6 +211,10 @@ std::unique_ptr<CSimNativeWriter> fqorvSimOpenNativeWriter(CSimNativeFormat theF
 
 /// A simulated orbit state as an archive's state vector at theTime (s from the reference day).
 CStateVector fqorvSimStateVector(const CSimState& theState, double theTime);
+
+/// The truth file's "state_vectors" of theVectors: times less theOffset (s from the scene's epoch
+/// when theOffset is the epoch's seconds from the vectors' midnight), positions, velocities.
+CJson fqorvSimVectorsJson(const std::vector<CStateVector>& theVectors, double theOffset, const std::string& theSource);
 
 /// The ENVISAT product name of a product: "SAR_IM__0P" ... ".E2" (".E1" for ERS-1), 62 characters,
 /// from the sensing start, its duration and the orbit.

@@ -81,7 +81,8 @@ void readTargets(CSimScene& s, const std::string& theText)
 /// "P[:VALUE],...": garbage of one field at pulses P, each with its value or the field's default.
 void readGarbage(CSimScene& s, CSimGarbageField theField, const std::string& theOption, const std::string& theText)
 {
-    if (s.mArchive == CSimArchive::Raw) bad(theOption + " writes into native archives only (--format ceos or e2)");
+    if (s.mArchive == CSimArchive::Raw || s.mArchive == CSimArchive::Alos)
+        bad(theOption + " writes into native ERS archives only (--format ceos or e2)");
     for (const std::string& aItem : split(theText, ',')) {
         const std::vector<std::string> p = split(aItem, ':');
         if (p.size() > 2) bad(theOption + ": expected PULSE or PULSE:VALUE, got \"" + aItem + "\"");
@@ -189,7 +190,8 @@ CSimArchive archiveOf(const std::string& theName)
     if (theName == "raw") return CSimArchive::Raw;
     if (theName == "ceos") return CSimArchive::Ceos;
     if (theName == "e2" || theName == "e1" || theName == "envisat") return CSimArchive::Envisat;
-    bad("--format: unknown format \"" + theName + "\" (raw, ceos, e2)");
+    if (theName == "alos") return CSimArchive::Alos;
+    bad("--format: unknown format \"" + theName + "\" (raw, ceos, e2, alos)");
 }
 
 }  // namespace
@@ -199,7 +201,7 @@ std::string fqorvSimUsage()
     return R"(usage: qorvex_simulate [options]
 
 Simulates a stripmap SAR raw product: ROOT (raw raster), ROOT.sml (header), ROOT_truth.json;
-with --format, an ERS CEOS or ENVISAT-format archive and ROOT_truth.json.
+with --format, an ERS CEOS, ENVISAT-format or ALOS archive and ROOT_truth.json.
 
 Scene:
   --preset NAME            ers2 (default), ers1, envisat, alos (FBS), alos-fbd
@@ -232,7 +234,8 @@ Faults (at pulse indices):
   --repeat-line n[,m..]    pulses recorded twice with the same counter
   --swst-change P:N        from pulse P on the sampling window moves by N codes (ERS: 4 samples a code,
                            the chain follows multiples of 22; ENVISAT and ALOS: samples); repeatable
-  --prf-change P:CODE      from pulse P on the PRI code is CODE; repeatable
+  --prf-change P:CODE      from pulse P on the PRI code is CODE; repeatable (ALOS: CODE in 210.94 ns
+                           units as for the raw product, the records state the PRF in mHz)
 Garbage in native archives (pulse lists, each P or P:VALUE; without a value the field's default):
   --wild-pri LIST          PRI code (default 0)
   --wild-swst LIST         SWST code (default 4095)
@@ -240,8 +243,9 @@ Garbage in native archives (pulse lists, each P or P:VALUE; without a value the 
   --corrupt-clock LIST     on-board time (default: the ticks XOR 0x5A5A5A5A)
   --corrupt-marker LIST    the 0xAA byte of the auxiliary block (default 0)
 Output:
-  --format raw|ceos|e2     raw product (default); ERS CEOS directory ROOT/; ENVISAT-format ROOT.E2
-                           (ROOT.E1 for ERS-1). ERS scenes only; the truth file is ROOT_truth.json
+  --format raw|ceos|e2|alos  raw product (default); ERS CEOS directory ROOT/; ENVISAT-format ROOT.E2
+                           (ROOT.E1 for ERS-1); ALOS level 1.0 directory ROOT/ (LED-<id>, IMG-HH-<id>,
+                           FBD also IMG-HV-<id>; presets alos, alos-fbd). The truth file is ROOT_truth.json
   --ceos-layout NAME       facility layout of the CEOS data file: pgs (default), co, eic, ccrs, asf
   --out ROOT               output root (default sim_<preset>)
   --write-doppler          write the true centroid as a one-row Processing.DopCenRangeCoeff

@@ -289,6 +289,13 @@ void deriveWindow(CSimScene& s, double theCentreRange)
     const int spc = std::max(1, s.mPrefix.mSwstSamplesPerCode);
     const int aWidth = s.mSamples - fqorvSimReplicaPoints(s.mRadar);
     const double aWanted = 2.0 * (theCentreRange - 0.5 * aWidth * s.mRadar.rangeSpacing()) / CQORV_SIM_LIGHT;
+    if (s.mArchive == CSimArchive::Alos) {
+        // The records state the first sample's slant range in whole metres.
+        const double aTau = std::isnan(s.mTauFirst) ? aWanted : s.mTauFirst;
+        s.mTauFirst = 2.0 * std::round(0.5 * CQORV_SIM_LIGHT * aTau) / CQORV_SIM_LIGHT;
+        s.mSwstCode0 = 0;
+        return;
+    }
     if (s.mArchive != CSimArchive::Raw) {
         snapWindowToCodes(s, aWanted);
         return;
@@ -409,9 +416,11 @@ void completeNative(CSimScene& s)
 {
     if (s.mArchive == CSimArchive::Raw) return;
     CSimRadar& r = s.mRadar;
-    if (s.mCodeBits != 5) throw std::runtime_error("an ERS archive holds 5-bit samples (--bits 5)");
+    if (s.mCodeBits != 5) throw std::runtime_error("a native archive holds 5-bit samples (--bits 5)");
     if (s.mHeaderOffset != 0) throw std::runtime_error("--header-offset has no place in a native archive");
-    if (s.mArchive == CSimArchive::Envisat) {
+    if (s.mArchive == CSimArchive::Alos) {
+        if (!s.mFaults.mGarbage.empty()) throw std::runtime_error("ALOS archives take no garbage codes");
+    } else if (s.mArchive == CSimArchive::Envisat) {
         if (s.mSamples != NQORV_SIM_ENVISAT::SAMPLES)
             throw std::runtime_error("an ENVISAT-format ERS line holds " + std::to_string(NQORV_SIM_ENVISAT::SAMPLES) +
                                      " samples, not " + std::to_string(s.mSamples));
@@ -461,6 +470,14 @@ void fqorvSimApplyArchive(CSimScene& theScene, CSimArchive theArchive, CSimCeosL
     theScene.mCeosLayout = theLayout;
     if (theArchive == CSimArchive::Raw) return;
     const std::string& aSensor = theScene.mRadar.mSensorName;
+    if ((theArchive == CSimArchive::Alos) != (aSensor == "ALOS_PALSAR"))
+        throw std::runtime_error(theArchive == CSimArchive::Alos
+                                     ? "ALOS archives hold ALOS PALSAR scenes only, not " + aSensor
+                                     : "ALOS PALSAR scenes are written as ALOS archives (--format alos)");
+    if (theArchive == CSimArchive::Alos) {
+        theScene.mPrefix.mPrfStep = 1e-3;
+        return;
+    }
     if ((aSensor != "ERS-1" && aSensor != "ERS-2") || theScene.mFormat != CSimSampleFormat::Ubyte5Bit)
         throw std::runtime_error("ERS CEOS and .E1/.E2 archives hold ERS-1 and ERS-2 scenes only, not " + aSensor +
                                  " (preset \"" + theScene.mPreset + "\")");
@@ -495,8 +512,8 @@ bool fqorvSimApplyPreset(CSimScene& theScene, const std::string& theName, bool t
 
 double fqorvSimPrfOfCode(const CSimPrefixLayout& theLayout, double theSamplingRate, int theCode)
 {
-    if (theLayout.mPriInSamples) return theSamplingRate / theCode;
-    return 1.0 / ((theCode + theLayout.mPriOffset) * theLayout.mPriUnit);
+    const double aPrf = theLayout.mPriInSamples ? theSamplingRate / theCode : 1.0 / ((theCode + theLayout.mPriOffset) * theLayout.mPriUnit);
+    return theLayout.mPrfStep > 0.0 ? std::round(aPrf / theLayout.mPrfStep) * theLayout.mPrfStep : aPrf;
 }
 
 int fqorvSimCodeOfPrf(const CSimPrefixLayout& theLayout, double theSamplingRate, double thePrf)

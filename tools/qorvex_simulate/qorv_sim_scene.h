@@ -37,6 +37,7 @@ struct CSimPrefixLayout {
     int mPriOffset = 2;
     bool mPriInSamples = false;   // PRI = code / fs instead (ENVISAT)
     int mRangePos = -1;           // int32 slant range of the first sample, m (ALOS)
+    double mPrfStep = 0.0;        // Hz: the PRF of a code is rounded to this step (ALOS archives state mHz); 0: exact
 };
 
 /// The radar: carrier, chirp, sampling, PRF, antenna.
@@ -95,8 +96,9 @@ struct CSimFaults {
     std::vector<CSimGarbage> mGarbage;                // native archives only
 };
 
-/// The form a scene is written in: the chain's raw product, or a native ERS archive.
-enum class CSimArchive { Raw, Ceos, Envisat };
+/// The form a scene is written in: the chain's raw product, a native ERS archive, or an ALOS
+/// PALSAR level 1.0 product.
+enum class CSimArchive { Raw, Ceos, Envisat, Alos };
 
 /// Target grid request: rows along azimuth, columns along range.
 struct CSimGridRequest {
@@ -195,9 +197,10 @@ int fqorvSimReplicaPoints(const CSimRadar& theRadar);
 const char* fqorvSimGarbageName(CSimGarbageField theField);
 bool fqorvSimParseGarbageField(const std::string& theName, CSimGarbageField& theField);
 
-/// The archive layer of a scene, applied right after the preset: the native formats hold ERS-1/2
-/// scenes only (std::runtime_error otherwise); an ENVISAT-format line holds 5616 samples, a CEOS
-/// record at most its layout's capacity.
+/// The archive layer of a scene, applied right after the preset: the native ERS formats hold ERS-1/2
+/// scenes only, the ALOS format ALOS scenes only (std::runtime_error otherwise); an ENVISAT-format
+/// line holds 5616 samples, a CEOS record at most its layout's capacity; an ALOS record states its
+/// PRF in mHz, so the scene's PRFs are whole mHz.
 void fqorvSimApplyArchive(CSimScene& theScene, CSimArchive theArchive, CSimCeosLayout theLayout);
 
 /// Derives what the layers left open (orbit placement, window, start time, targets) and checks

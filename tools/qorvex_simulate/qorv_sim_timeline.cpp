@@ -9,7 +9,9 @@ CSimTimeline::CSimTimeline(const CSimScene& theScene)
       mSamplingRate(theScene.mRadar.mSamplingRate),
       mSamplesPerCode(theScene.mPrefix.mSwstSamplesPerCode),
       mSwstCode0(theScene.mSwstCode0),
-      mWindowRank(theScene.mArchive == CSimArchive::Raw ? 0 : NQORV_ERS::RANK)
+      // An ERS archive times the window from the pulse 9 PRIs earlier; the chain's raw products and
+      // ALOS records state the window of the pulse itself.
+      mWindowRank(theScene.mArchive == CSimArchive::Ceos || theScene.mArchive == CSimArchive::Envisat ? NQORV_ERS::RANK : 0)
 {
     // PRI segments: the first PRF, then one segment per change in pulse order.
     std::vector<std::pair<long, int>> aChanges = theScene.mFaults.mPrfChanges;

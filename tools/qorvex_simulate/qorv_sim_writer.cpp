@@ -15,6 +15,7 @@
 #include "qorv_description_section.h"
 #include "qorv_generic_utility.h"
 #include "qorv_raster_file.h"
+#include "qorv_sim_alos.h"
 #include "qorv_sim_echo.h"
 #include "qorv_sim_format.h"
 #include "qorv_sim_header.h"
@@ -250,10 +251,44 @@ CSimRunReport runNative(const CSimScene& theScene, const std::string& theRoot, c
     return aReport;
 }
 
+/// An ALOS product: the same road as the ERS archives, through the ALOS writer.
+CSimRunReport runAlos(const CSimScene& theScene, const std::string& theRoot, const CSimProgress& theProgress)
+{
+    const auto aStart = std::chrono::steady_clock::now();
+    CSimRunReport aReport;
+    const std::filesystem::path aArchive = theRoot;
+    aReport.mRaster = aArchive.string();
+    aReport.mTruth = theRoot + "_truth.json";
+    countTargets(theScene, aReport);
+    std::remove(aReport.mTruth.c_str());
+
+    const std::unique_ptr<CSimOrbit> aOrbit = fqorvSimMakeOrbit(theScene);
+    const CSimTimeline aTimeline(theScene);
+    const CSimEchoGenerator aGenerator(theScene, *aOrbit, aTimeline);
+    const CSimSceneTruth aTruth = fqorvSimComputeTruth(theScene, *aOrbit, aTimeline);
+    const CSimAlosProduct aProduct = fqorvSimAlosSceneProduct(theScene, aTimeline, *aOrbit, aTruth);
+    CSimAlosWriter aWriter(aProduct, aArchive);
+
+    CSimRunFigures aFigures;
+    const CRecordSink aSink = [&](const CSimRecord& r, std::size_t, const uint8_t* theSamples) {
+        aWriter.writeLine(fqorvSimAlosSceneLine(theScene, aTimeline, aProduct, r), theSamples);
+    };
+    writeRecordsWith(theScene, aTimeline, aGenerator, aSink, aReport, aFigures, theProgress);
+
+    aFigures.mRasterName = aArchive.filename().string();
+    CJson aTruthJson = fqorvSimTruthJson(theScene, aTruth, aTimeline, *aOrbit, aFigures);
+    fqorvSimAddAlosTruth(aTruthJson, theScene, aProduct, aArchive);
+    aTruthJson.dumpFile(aReport.mTruth);
+    aWriter.finish();
+    aReport.mSeconds = secondsSince(aStart);
+    return aReport;
+}
+
 }  // namespace
 
 CSimRunReport fqorvSimRun(const CSimScene& theScene, const std::string& theRoot, const CSimProgress& theProgress)
 {
+    if (theScene.mArchive == CSimArchive::Alos) return runAlos(theScene, theRoot, theProgress);
     if (theScene.mArchive != CSimArchive::Raw) return runNative(theScene, theRoot, theProgress);
     const auto aStart = std::chrono::steady_clock::now();
     CSimRunReport aReport;

@@ -6,7 +6,8 @@
 // is complete, and stale files of an earlier run under the same root are removed first.
 // A scene for a native ERS archive gives the archive (the CEOS directory R, or R.E2 / R.E1) and
 // R_truth.json: the archive is written under its ".part" name, the truth file next, and the
-// archive renamed into place last.
+// archive renamed into place last. An ALOS scene gives the product directory R (leader and image
+// files) and R_truth.json the same way.
 #pragma once
 
 #include <functional>
