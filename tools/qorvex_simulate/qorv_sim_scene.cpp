@@ -5,6 +5,7 @@
 #include <stdexcept>
 
 #include "qorv_json.h"
+#include "qorv_sim_asar.h"
 #include "qorv_sim_geometry.h"
 #include "qorv_sim_random.h"
 #include "qorv_sim_timeline.h"
@@ -289,6 +290,10 @@ void deriveWindow(CSimScene& s, double theCentreRange)
     const int spc = std::max(1, s.mPrefix.mSwstSamplesPerCode);
     const int aWidth = s.mSamples - fqorvSimReplicaPoints(s.mRadar);
     const double aWanted = 2.0 * (theCentreRange - 0.5 * aWidth * s.mRadar.rangeSpacing()) / CQORV_SIM_LIGHT;
+    if (s.mArchive == CSimArchive::Asar) {
+        fqorvSimAsarSnapWindow(s, aWanted);
+        return;
+    }
     if (s.mArchive != CSimArchive::Raw) {
         snapWindowToCodes(s, aWanted);
         return;
@@ -408,6 +413,10 @@ void checkFaults(const CSimScene& s)
 void completeNative(CSimScene& s)
 {
     if (s.mArchive == CSimArchive::Raw) return;
+    if (s.mArchive == CSimArchive::Asar) {
+        fqorvSimAsarCompleteScene(s);
+        return;
+    }
     CSimRadar& r = s.mRadar;
     if (s.mCodeBits != 5) throw std::runtime_error("an ERS archive holds 5-bit samples (--bits 5)");
     if (s.mHeaderOffset != 0) throw std::runtime_error("--header-offset has no place in a native archive");
@@ -461,6 +470,12 @@ void fqorvSimApplyArchive(CSimScene& theScene, CSimArchive theArchive, CSimCeosL
     theScene.mCeosLayout = theLayout;
     if (theArchive == CSimArchive::Raw) return;
     const std::string& aSensor = theScene.mRadar.mSensorName;
+    if (theArchive == CSimArchive::Asar) {
+        if (aSensor != "ENVISAT-1" || theScene.mFormat != CSimSampleFormat::FloatBaq4Bit)
+            throw std::runtime_error("ASAR level 0 products hold ENVISAT-1 scenes only, not " + aSensor + " (preset \"" +
+                                     theScene.mPreset + "\")");
+        return;
+    }
     if ((aSensor != "ERS-1" && aSensor != "ERS-2") || theScene.mFormat != CSimSampleFormat::Ubyte5Bit)
         throw std::runtime_error("ERS CEOS and .E1/.E2 archives hold ERS-1 and ERS-2 scenes only, not " + aSensor +
                                  " (preset \"" + theScene.mPreset + "\")");

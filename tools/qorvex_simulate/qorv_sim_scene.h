@@ -93,10 +93,13 @@ struct CSimFaults {
     std::vector<std::pair<long, int>> mSwstChanges;   // from pulse p on the code moves by n codes
     std::vector<std::pair<long, int>> mPrfChanges;    // from pulse p on the PRI code is c
     std::vector<CSimGarbage> mGarbage;                // native archives only
+    std::vector<long> mCalibrationPulses;             // ASAR: the echo packet is a calibration packet
+    long mNoisePackets = 8;                           // ASAR: noise packets before the first echo
 };
 
-/// The form a scene is written in: the chain's raw product, or a native ERS archive.
-enum class CSimArchive { Raw, Ceos, Envisat };
+/// The form a scene is written in: the chain's raw product, a native ERS archive, or an ENVISAT
+/// ASAR level 0 product (Asar).
+enum class CSimArchive { Raw, Ceos, Envisat, Asar };
 
 /// Target grid request: rows along azimuth, columns along range.
 struct CSimGridRequest {

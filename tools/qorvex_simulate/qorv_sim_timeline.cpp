@@ -3,13 +3,17 @@
 #include <algorithm>
 #include <cmath>
 
+#include "qorv_sim_asar.h"
+
 CSimTimeline::CSimTimeline(const CSimScene& theScene)
     : mPulses(theScene.mPulses),
       mTauFirst(theScene.mTauFirst),
       mSamplingRate(theScene.mRadar.mSamplingRate),
       mSamplesPerCode(theScene.mPrefix.mSwstSamplesPerCode),
       mSwstCode0(theScene.mSwstCode0),
-      mWindowRank(theScene.mArchive == CSimArchive::Raw ? 0 : NQORV_ERS::RANK)
+      mWindowRank(theScene.mArchive == CSimArchive::Raw    ? 0
+                  : theScene.mArchive == CSimArchive::Asar ? fqorvSimAsarRank(theScene)
+                                                           : NQORV_ERS::RANK)
 {
     // PRI segments: the first PRF, then one segment per change in pulse order.
     std::vector<std::pair<long, int>> aChanges = theScene.mFaults.mPrfChanges;
