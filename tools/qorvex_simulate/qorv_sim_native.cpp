@@ -331,6 +331,52 @@ std::string dataSetDescriptor(const char* theName, char theType, const std::stri
     return padded(d, NQORV_SIM_ENVISAT::DSD_SIZE);
 }
 
+/// The main product header: the product's identity, clock and first state vector.
+std::string mainProductHeader(const CSimNativeProduct& p, const CSimEnvisatMph& m)
+{
+    const CStateVector v = p.mStateVectors.empty() ? CStateVector{} : p.mStateVectors.front();
+    auto date = [&p](double t) { return envisatDate(p.mReferenceDay, t); };
+    std::string h = quoted("PRODUCT", m.mName, 62);
+    h += "PROC_STAGE=X\n";
+    h += quoted("REF_DOC", "", 23);
+    h += blankLine(40);
+    h += quoted("ACQUISITION_STATION", p.mFacility, 20);
+    h += quoted("PROC_CENTER", p.mFacility, 6);
+    h += quoted("PROC_TIME", date(m.mStop), 27);
+    h += quoted("SOFTWARE_VER", p.mProcessor, 14);
+    h += blankLine(40);
+    h += quoted("SENSING_START", date(m.mStart), 27);
+    h += quoted("SENSING_STOP", date(m.mStop), 27);
+    h += blankLine(40);
+    h += "PHASE=X\n";
+    h += signedNumber("CYCLE", 0, 3);
+    h += signedNumber("REL_ORBIT", 0, 5);
+    h += signedNumber("ABS_ORBIT", p.mOrbit, 5);
+    h += quoted("STATE_VECTOR_TIME", p.mStateVectors.empty() ? "" : date(v.mTime), 27);
+    h += "DELTA_UT1=+.000000<s>\n";
+    const char* const aPos[3] = {"X_POSITION", "Y_POSITION", "Z_POSITION"};
+    const char* const aVel[3] = {"X_VELOCITY", "Y_VELOCITY", "Z_VELOCITY"};
+    for (int i = 0; i < 3; ++i) h += signedFixed(aPos[i], v.mPosition[i], 12, 3, "<m>");
+    for (int i = 0; i < 3; ++i) h += signedFixed(aVel[i], v.mVelocity[i], 12, 6, "<m/s>");
+    h += quoted("VECTOR_SOURCE", p.mStateVectors.empty() ? "" : p.mVectorSource, 2);
+    h += blankLine(40);
+    h += quoted("UTC_SBT_TIME", date(p.mClock.mReferenceTime), 27);
+    h += signedNumber("SAT_BINARY_TIME", p.mClock.mReferenceTicks, 10);
+    h += signedNumber("CLOCK_STEP", std::llround(p.mClock.mTickSeconds * 1e12), 10, "<ps>");
+    h += blankLine(32);
+    h += quoted("LEAP_UTC", "", 27);
+    h += signedNumber("LEAP_SIGN", 0, 3);
+    h += "LEAP_ERR=0\n";
+    h += blankLine(40);
+    h += "PRODUCT_ERR=0\n";
+    h += signedNumber("TOT_SIZE", static_cast<long long>(m.mTotalSize), 20, "<bytes>");
+    h += signedNumber("SPH_SIZE", m.mSphSize, 10, "<bytes>");
+    h += signedNumber("NUM_DSD", m.mNumDsd, 10);
+    h += signedNumber("DSD_SIZE", NQORV_SIM_ENVISAT::DSD_SIZE, 10, "<bytes>");
+    h += signedNumber("NUM_DATA_SETS", m.mNumDataSets, 10);
+    return padded(h, NQORV_SIM_ENVISAT::MPH_SIZE);
+}
+
 class CEnvisatWriter : public CSimNativeWriter {
 public:
     CEnvisatWriter(const CSimNativeProduct& theProduct, const fs::path& thePath)
@@ -387,62 +433,17 @@ public:
     }
 
 private:
-    /// MJD2000 days, seconds and microseconds.
-    void putSensingTime(uint8_t* r, double t) const
-    {
-        const CCivilTime c = civilTime(mProduct.mReferenceDay, t, 1e-6);
-        fqorvSimPutBE32(r, static_cast<uint32_t>(static_cast<int32_t>(c.mDayNumber - NQORV_SIM_ENVISAT::MJD2000_DAY)));
-        fqorvSimPutBE32(r + 4, static_cast<uint32_t>(c.mSecondOfDay));
-        fqorvSimPutBE32(r + 8, static_cast<uint32_t>(c.mFraction));
-    }
-
-    std::string date(double t) const { return envisatDate(mProduct.mReferenceDay, t); }
+    void putSensingTime(uint8_t* r, double t) const { fqorvSimPutMjd2000(r, mProduct.mReferenceDay, t); }
 
     std::string mainHeader(long theCount, double theStart, double theStop) const
     {
-        const CSimNativeProduct& p = mProduct;
-        const CStateVector& v = p.mStateVectors.front();
-        const unsigned long long aSize =
+        CSimEnvisatMph m;
+        m.mName = fqorvSimEnvisatProductName(mProduct, theStart, theStop);
+        m.mStart = theStart;
+        m.mStop = theStop;
+        m.mTotalSize =
             NQORV_SIM_ENVISAT::DATA_OFFSET + static_cast<unsigned long long>(theCount) * NQORV_SIM_ENVISAT::RECORD_SIZE;
-        std::string h = quoted("PRODUCT", fqorvSimEnvisatProductName(p, theStart, theStop), 62);
-        h += "PROC_STAGE=X\n";
-        h += quoted("REF_DOC", "", 23);
-        h += blankLine(40);
-        h += quoted("ACQUISITION_STATION", p.mFacility, 20);
-        h += quoted("PROC_CENTER", p.mFacility, 6);
-        h += quoted("PROC_TIME", date(theStop), 27);
-        h += quoted("SOFTWARE_VER", p.mProcessor, 14);
-        h += blankLine(40);
-        h += quoted("SENSING_START", date(theStart), 27);
-        h += quoted("SENSING_STOP", date(theStop), 27);
-        h += blankLine(40);
-        h += "PHASE=X\n";
-        h += signedNumber("CYCLE", 0, 3);
-        h += signedNumber("REL_ORBIT", 0, 5);
-        h += signedNumber("ABS_ORBIT", p.mOrbit, 5);
-        h += quoted("STATE_VECTOR_TIME", date(v.mTime), 27);
-        h += "DELTA_UT1=+.000000<s>\n";
-        const char* const aPos[3] = {"X_POSITION", "Y_POSITION", "Z_POSITION"};
-        const char* const aVel[3] = {"X_VELOCITY", "Y_VELOCITY", "Z_VELOCITY"};
-        for (int i = 0; i < 3; ++i) h += signedFixed(aPos[i], v.mPosition[i], 12, 3, "<m>");
-        for (int i = 0; i < 3; ++i) h += signedFixed(aVel[i], v.mVelocity[i], 12, 6, "<m/s>");
-        h += quoted("VECTOR_SOURCE", p.mVectorSource, 2);
-        h += blankLine(40);
-        h += quoted("UTC_SBT_TIME", date(p.mClock.mReferenceTime), 27);
-        h += signedNumber("SAT_BINARY_TIME", p.mClock.mReferenceTicks, 10);
-        h += signedNumber("CLOCK_STEP", std::llround(p.mClock.mTickSeconds * 1e12), 10, "<ps>");
-        h += blankLine(32);
-        h += quoted("LEAP_UTC", "", 27);
-        h += signedNumber("LEAP_SIGN", 0, 3);
-        h += "LEAP_ERR=0\n";
-        h += blankLine(40);
-        h += "PRODUCT_ERR=0\n";
-        h += signedNumber("TOT_SIZE", static_cast<long long>(aSize), 20, "<bytes>");
-        h += signedNumber("SPH_SIZE", NQORV_SIM_ENVISAT::SPH_SIZE, 10, "<bytes>");
-        h += signedNumber("NUM_DSD", NQORV_SIM_ENVISAT::NUM_DSD, 10);
-        h += signedNumber("DSD_SIZE", NQORV_SIM_ENVISAT::DSD_SIZE, 10, "<bytes>");
-        h += signedNumber("NUM_DATA_SETS", 1, 10);
-        return padded(h, NQORV_SIM_ENVISAT::MPH_SIZE);
+        return mainProductHeader(mProduct, m);
     }
 
     std::string specificHeader(long theCount) const
@@ -512,21 +513,62 @@ std::unique_ptr<CSimNativeWriter> fqorvSimOpenNativeWriter(CSimNativeFormat theF
     return std::make_unique<CEnvisatWriter>(theProduct, thePath);
 }
 
-std::string fqorvSimEnvisatProductName(const CSimNativeProduct& theProduct, double theSensingStart, double theSensingStop)
+std::string fqorvSimEnvisatName(const std::string& theType, const CSimNativeProduct& theProduct, double theStart,
+                                double theStop, const std::string& theExtension)
 {
-    const CCivilTime c = civilTime(theProduct.mReferenceDay, theSensingStart, 1.0);
+    const CCivilTime c = civilTime(theProduct.mReferenceDay, theStart, 1.0);
     // The originator: the first three letters or digits of the facility.
     std::string aCentre;
     for (char ch : theProduct.mFacility)
         if (std::isalnum(static_cast<unsigned char>(ch)) && aCentre.size() < 3)
             aCentre += static_cast<char>(std::toupper(static_cast<unsigned char>(ch)));
     aCentre.resize(3, 'X');
-    const long aDuration = std::max(0L, static_cast<long>(std::ceil(theSensingStop - theSensingStart)));
-    char aName[80];
-    std::snprintf(aName, sizeof aName, "SAR_IM__0PX%s%04d%02d%02d_%02d%02d%02d_%08ldX000_00000_%05d_0000.%s",
+    const long aDuration = std::max(0L, static_cast<long>(std::ceil(theStop - theStart)));
+    char aName[96];
+    std::snprintf(aName, sizeof aName, "%.10sX%s%04d%02d%02d_%02d%02d%02d_%08ldX000_00000_%05d_0000%s", theType.c_str(),
                   aCentre.c_str(), c.mYear, c.mMonth, c.mDay, c.mHour, c.mMinute, c.mSecond, aDuration,
-                  theProduct.mOrbit % 100000, isErs1(theProduct) ? "E1" : "E2");
+                  theProduct.mOrbit % 100000, theExtension.c_str());
     return aName;
+}
+
+std::string fqorvSimEnvisatProductName(const CSimNativeProduct& theProduct, double theSensingStart, double theSensingStop)
+{
+    return fqorvSimEnvisatName("SAR_IM__0P", theProduct, theSensingStart, theSensingStop,
+                               isErs1(theProduct) ? ".E1" : ".E2");
+}
+
+std::string fqorvSimEnvisatDate(long theDay, double theSeconds) { return envisatDate(theDay, theSeconds); }
+
+std::string fqorvSimEnvisatText(const char* theKey, const std::string& theText, std::size_t theWidth)
+{
+    return quoted(theKey, theText, theWidth);
+}
+
+std::string fqorvSimEnvisatNumber(const char* theKey, long long theValue, int theDigits, const char* theUnit)
+{
+    return signedNumber(theKey, theValue, theDigits, theUnit);
+}
+
+std::string fqorvSimEnvisatPadded(const std::string& theText, std::size_t theSize) { return padded(theText, theSize); }
+
+std::string fqorvSimEnvisatDescriptor(const char* theName, char theType, const std::string& theFile,
+                                      unsigned long long theOffset, unsigned long long theSize, long theCount,
+                                      long theRecordSize)
+{
+    return dataSetDescriptor(theName, theType, theFile, theOffset, theSize, theCount, theRecordSize);
+}
+
+std::string fqorvSimEnvisatMainHeader(const CSimNativeProduct& theProduct, const CSimEnvisatMph& theHeader)
+{
+    return mainProductHeader(theProduct, theHeader);
+}
+
+void fqorvSimPutMjd2000(uint8_t* theOut, long theDay, double theSeconds)
+{
+    const CCivilTime c = civilTime(theDay, theSeconds, 1e-6);
+    fqorvSimPutBE32(theOut, static_cast<uint32_t>(static_cast<int32_t>(c.mDayNumber - NQORV_SIM_ENVISAT::MJD2000_DAY)));
+    fqorvSimPutBE32(theOut + 4, static_cast<uint32_t>(c.mSecondOfDay));
+    fqorvSimPutBE32(theOut + 8, static_cast<uint32_t>(c.mFraction));
 }
 
 // ------------------------------------------------------------------------------------------------

@@ -72,12 +72,14 @@
 
 #include <cmath>
 #include <cstdint>
+#include <cstdio>
 #include <filesystem>
 #include <memory>
 #include <string>
 #include <vector>
 
 #include "qorv_native_archive.h"
+#include "qorv_sim_ceos.h"
 #include "qorv_sim_orbit.h"
 
 class CJson;
@@ -220,6 +222,46 @@ CJson fqorvSimVectorsJson(const std::vector<CStateVector>& theVectors, double th
 /// from the sensing start, its duration and the orbit.
 std::string fqorvSimEnvisatProductName(const CSimNativeProduct& theProduct, double theSensingStart,
                                        double theSensingStop);
+
+// ---- Pieces every writer of ENVISAT-format files shares -----------------------------------------
+
+/// A file written from its start (under a ".part" name, by the caller's choice), with fields
+/// patched in place at the end: the CEOS writers' part file.
+using CSimPartFile = NQORV_SIM_CEOS::CPartFile;
+
+/// "DD-MMM-YYYY hh:mm:ss.uuuuuu" of a time in s from the midnight of theDay (days since 1970-01-01).
+std::string fqorvSimEnvisatDate(long theDay, double theSeconds);
+/// KEY="text" (the text cut or blank padded to theWidth) and a line end.
+std::string fqorvSimEnvisatText(const char* theKey, const std::string& theText, std::size_t theWidth);
+/// KEY=+000123<unit>: a signed whole number of theDigits digits and a line end.
+std::string fqorvSimEnvisatNumber(const char* theKey, long long theValue, int theDigits, const char* theUnit = "");
+/// A header text completed with a line of blanks to theSize bytes; std::runtime_error when longer.
+std::string fqorvSimEnvisatPadded(const std::string& theText, std::size_t theSize);
+/// A data set descriptor of NQORV_SIM_ENVISAT::DSD_SIZE bytes (DS_NAME, DS_TYPE, FILENAME,
+/// DS_OFFSET, DS_SIZE, NUM_DSR, DSR_SIZE).
+std::string fqorvSimEnvisatDescriptor(const char* theName, char theType, const std::string& theFile,
+                                      unsigned long long theOffset, unsigned long long theSize, long theCount,
+                                      long theRecordSize);
+
+/// What a main product header states beyond the product's values.
+struct CSimEnvisatMph {
+    std::string mName;                        // PRODUCT, up to 62 characters
+    double mStart = NAN, mStop = NAN;         // SENSING_START and _STOP, s from the reference day
+    unsigned long long mTotalSize = 0;        // TOT_SIZE, bytes
+    int mSphSize = NQORV_SIM_ENVISAT::SPH_SIZE;
+    int mNumDsd = NQORV_SIM_ENVISAT::NUM_DSD;
+    int mNumDataSets = 1;
+};
+/// The main product header (NQORV_SIM_ENVISAT::MPH_SIZE bytes) of a product: its identity, clock
+/// and first state vector (zeros and a blank VECTOR_SOURCE when it has none).
+std::string fqorvSimEnvisatMainHeader(const CSimNativeProduct& theProduct, const CSimEnvisatMph& theHeader);
+/// An ENVISAT file name: theType (10 characters, "SAR_IM__0P"), "X", the first three letters of the
+/// facility, the start (date and time to the second), the duration (s), the orbit, theExtension.
+std::string fqorvSimEnvisatName(const std::string& theType, const CSimNativeProduct& theProduct, double theStart,
+                                double theStop, const std::string& theExtension);
+/// A record's sensing time at theOut: days since 2000-01-01 (s32), second of the day (u32) and
+/// microseconds (u32) of a time in s from the midnight of theDay, rounded to the microsecond.
+void fqorvSimPutMjd2000(uint8_t* theOut, long theDay, double theSeconds);
 
 // ---- The simulator's scenes as native archives --------------------------------------------------
 

@@ -155,6 +155,14 @@ const std::map<std::string, Handler>& valueOptions()
         {"--wild-counter", garbageOption(CSimGarbageField::Counter)},
         {"--corrupt-clock", garbageOption(CSimGarbageField::Clock)},
         {"--corrupt-marker", garbageOption(CSimGarbageField::Marker)},
+        {"--noise-packets", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) {
+             if (s.mArchive != CSimArchive::Asar) bad(o + " goes with --format n1");
+             s.mFaults.mNoisePackets = toLong(o, v, 0, 100000);
+         }},
+        {"--cal-packets", [](CSimScene& s, CSimCommand&, const std::string& o, const std::string& v) {
+             if (s.mArchive != CSimArchive::Asar) bad(o + " goes with --format n1");
+             for (const std::string& p : split(v, ',')) s.mFaults.mCalibrationPulses.push_back(toLong(o, p, 0, 899999));
+         }},
     };
     return aOptions;
 }
@@ -190,8 +198,9 @@ CSimArchive archiveOf(const std::string& theName)
     if (theName == "raw") return CSimArchive::Raw;
     if (theName == "ceos") return CSimArchive::Ceos;
     if (theName == "e2" || theName == "e1" || theName == "envisat") return CSimArchive::Envisat;
+    if (theName == "n1") return CSimArchive::Asar;
     if (theName == "alos") return CSimArchive::Alos;
-    bad("--format: unknown format \"" + theName + "\" (raw, ceos, e2, alos)");
+    bad("--format: unknown format \"" + theName + "\" (raw, ceos, e2, n1, alos)");
 }
 
 }  // namespace
@@ -242,10 +251,15 @@ Garbage in native archives (pulse lists, each P or P:VALUE; without a value the 
   --wild-counter LIST      image format counter (default: half the 24-bit range away)
   --corrupt-clock LIST     on-board time (default: the ticks XOR 0x5A5A5A5A)
   --corrupt-marker LIST    the 0xAA byte of the auxiliary block (default 0)
+ASAR packets (--format n1):
+  --noise-packets N        noise packets before the first echo (default 8)
+  --cal-packets LIST       pulses whose echo packet is a calibration packet (comma separated)
 Output:
-  --format raw|ceos|e2|alos  raw product (default); ERS CEOS directory ROOT/; ENVISAT-format ROOT.E2
-                           (ROOT.E1 for ERS-1); ALOS level 1.0 directory ROOT/ (LED-<id>, IMG-HH-<id>,
-                           FBD also IMG-HV-<id>; presets alos, alos-fbd). The truth file is ROOT_truth.json
+  --format raw|ceos|e2|n1|alos  raw product (default); ERS CEOS directory ROOT/; ENVISAT-format ROOT.E2
+                           (ROOT.E1 for ERS-1), ERS scenes only; n1: ENVISAT ASAR level 0 ROOT.N1 with
+                           ROOT_ASA_INS_AX and ROOT_DOR_VOR_AX (preset envisat); alos: ALOS level 1.0
+                           directory ROOT/ (LED-<id>, IMG-HH-<id>, FBD also IMG-HV-<id>; presets alos,
+                           alos-fbd). The truth file is ROOT_truth.json
   --ceos-layout NAME       facility layout of the CEOS data file: pgs (default), co, eic, ccrs, asf
   --out ROOT               output root (default sim_<preset>)
   --write-doppler          write the true centroid as a one-row Processing.DopCenRangeCoeff

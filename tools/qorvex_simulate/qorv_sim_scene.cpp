@@ -5,6 +5,7 @@
 #include <stdexcept>
 
 #include "qorv_json.h"
+#include "qorv_sim_asar.h"
 #include "qorv_sim_geometry.h"
 #include "qorv_sim_random.h"
 #include "qorv_sim_timeline.h"
@@ -296,6 +297,10 @@ void deriveWindow(CSimScene& s, double theCentreRange)
         s.mSwstCode0 = 0;
         return;
     }
+    if (s.mArchive == CSimArchive::Asar) {
+        fqorvSimAsarSnapWindow(s, aWanted);
+        return;
+    }
     if (s.mArchive != CSimArchive::Raw) {
         snapWindowToCodes(s, aWanted);
         return;
@@ -415,6 +420,10 @@ void checkFaults(const CSimScene& s)
 void completeNative(CSimScene& s)
 {
     if (s.mArchive == CSimArchive::Raw) return;
+    if (s.mArchive == CSimArchive::Asar) {
+        fqorvSimAsarCompleteScene(s);
+        return;
+    }
     CSimRadar& r = s.mRadar;
     if (s.mCodeBits != 5) throw std::runtime_error("a native archive holds 5-bit samples (--bits 5)");
     if (s.mHeaderOffset != 0) throw std::runtime_error("--header-offset has no place in a native archive");
@@ -476,6 +485,12 @@ void fqorvSimApplyArchive(CSimScene& theScene, CSimArchive theArchive, CSimCeosL
                                      : "ALOS PALSAR scenes are written as ALOS archives (--format alos)");
     if (theArchive == CSimArchive::Alos) {
         theScene.mPrefix.mPrfStep = 1e-3;
+        return;
+    }
+    if (theArchive == CSimArchive::Asar) {
+        if (aSensor != "ENVISAT-1" || theScene.mFormat != CSimSampleFormat::FloatBaq4Bit)
+            throw std::runtime_error("ASAR level 0 products hold ENVISAT-1 scenes only, not " + aSensor + " (preset \"" +
+                                     theScene.mPreset + "\")");
         return;
     }
     if ((aSensor != "ERS-1" && aSensor != "ERS-2") || theScene.mFormat != CSimSampleFormat::Ubyte5Bit)

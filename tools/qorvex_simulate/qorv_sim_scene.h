@@ -94,11 +94,13 @@ struct CSimFaults {
     std::vector<std::pair<long, int>> mSwstChanges;   // from pulse p on the code moves by n codes
     std::vector<std::pair<long, int>> mPrfChanges;    // from pulse p on the PRI code is c
     std::vector<CSimGarbage> mGarbage;                // native archives only
+    std::vector<long> mCalibrationPulses;             // ASAR: the echo packet is a calibration packet
+    long mNoisePackets = 8;                           // ASAR: noise packets before the first echo
 };
 
-/// The form a scene is written in: the chain's raw product, a native ERS archive, or an ALOS
-/// PALSAR level 1.0 product.
-enum class CSimArchive { Raw, Ceos, Envisat, Alos };
+/// The form a scene is written in: the chain's raw product, a native ERS archive, an ENVISAT ASAR
+/// level 0 product (Asar) or an ALOS PALSAR level 1.0 product.
+enum class CSimArchive { Raw, Ceos, Envisat, Asar, Alos };
 
 /// Target grid request: rows along azimuth, columns along range.
 struct CSimGridRequest {

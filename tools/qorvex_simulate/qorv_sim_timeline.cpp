@@ -3,15 +3,20 @@
 #include <algorithm>
 #include <cmath>
 
+#include "qorv_sim_asar.h"
+
 CSimTimeline::CSimTimeline(const CSimScene& theScene)
     : mPulses(theScene.mPulses),
       mTauFirst(theScene.mTauFirst),
       mSamplingRate(theScene.mRadar.mSamplingRate),
       mSamplesPerCode(theScene.mPrefix.mSwstSamplesPerCode),
       mSwstCode0(theScene.mSwstCode0),
-      // An ERS archive times the window from the pulse 9 PRIs earlier; the chain's raw products and
-      // ALOS records state the window of the pulse itself.
-      mWindowRank(theScene.mArchive == CSimArchive::Ceos || theScene.mArchive == CSimArchive::Envisat ? NQORV_ERS::RANK : 0)
+      // An ERS archive times the window from the pulse 9 PRIs earlier, an ASAR one from the pulse
+      // of its beam's rank; the chain's raw products and ALOS records state the window of the pulse
+      // itself.
+      mWindowRank(theScene.mArchive == CSimArchive::Ceos || theScene.mArchive == CSimArchive::Envisat ? NQORV_ERS::RANK
+                  : theScene.mArchive == CSimArchive::Asar                                          ? fqorvSimAsarRank(theScene)
+                                                                                                     : 0)
 {
     // PRI segments: the first PRF, then one segment per change in pulse order.
     std::vector<std::pair<long, int>> aChanges = theScene.mFaults.mPrfChanges;

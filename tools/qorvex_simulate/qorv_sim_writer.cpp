@@ -16,6 +16,7 @@
 #include "qorv_generic_utility.h"
 #include "qorv_raster_file.h"
 #include "qorv_sim_alos.h"
+#include "qorv_sim_asar.h"
 #include "qorv_sim_echo.h"
 #include "qorv_sim_format.h"
 #include "qorv_sim_header.h"
@@ -40,6 +41,13 @@ int threadCount(const CSimScene& s)
     return std::clamp(s.mThreads > 0 ? s.mThreads : aHardware, 1, 64);
 }
 
+/// Bytes of one encoded line: I,Q bytes, decoded floats, or an ASAR packet's FBAQ blocks.
+int lineBytes(const CSimScene& s)
+{
+    if (s.mArchive == CSimArchive::Asar) return fqorvSimFbaqBytes(s.mSamples);
+    return s.mSamples * (s.mFormat == CSimSampleFormat::Ubyte5Bit ? 2 : 8);
+}
+
 /// One block of pulses: encoded samples and clip counts, per pulse.
 struct CBlock {
     long mFirst = 0;
@@ -60,7 +68,9 @@ void generateBlock(const CSimScene& s, const CSimEchoGenerator& theGenerator, do
             theGenerator.echo(k, aLine.data());
             theGenerator.addNoise(k, aLine.data());
             uint8_t* out = b.mBytes.data() + static_cast<std::size_t>(i) * b.mBytesPerLine;
-            if (s.mFormat == CSimSampleFormat::Ubyte5Bit)
+            if (s.mArchive == CSimArchive::Asar)
+                b.mClipped[i] = fqorvSimFbaqEncoder().encode(aLine.data(), s.mSamples, theGain, out);
+            else if (s.mFormat == CSimSampleFormat::Ubyte5Bit)
                 b.mClipped[i] = fqorvSimQuantiseBytes(aLine.data(), s.mSamples, theGain, s.mCodeBits, out);
             else
                 b.mClipped[i] = fqorvSimQuantiseBaq4Bit(aLine.data(), s.mSamples, reinterpret_cast<float*>(out));
@@ -102,7 +112,7 @@ void streamRecords(const CSimScene& s, const CSimTimeline& tl, const CSimEchoGen
     const int aThreads = threadCount(s);
     theReport.mThreads = aThreads;
     CBlock b;
-    b.mBytesPerLine = s.mSamples * (s.mFormat == CSimSampleFormat::Ubyte5Bit ? 2 : 8);
+    b.mBytesPerLine = lineBytes(s);
     b.mBytes.resize(static_cast<std::size_t>(CQORV_SIM_BLOCK) * b.mBytesPerLine);
     b.mClipped.resize(CQORV_SIM_BLOCK);
     const std::vector<CSimRecord>& aRecords = tl.records();
@@ -129,20 +139,21 @@ void streamRecords(const CSimScene& s, const CSimTimeline& tl, const CSimEchoGen
 
 /// The byte-code gain: codes per unit amplitude so that each component's rms is mRmsDn 5-bit codes
 /// (the same fraction of the full scale for wider codes), the signal
-/// power estimated from noise-free echoes of 64 pulses spread over the scene.
+/// power estimated from noise-free echoes of 64 pulses spread over the scene. FBAQ (ASAR): the
+/// scale that brings each component's rms to 1, the middle of the code book's gains.
 double quantiserGain(const CSimScene& s, const CSimEchoGenerator& g, double& theSignalPower)
 {
     theSignalPower = g.meanSignalPower(static_cast<int>(std::min<long>(64, s.mPulses)));
     if (s.mGain > 0.0) return s.mGain;
     const double aComponentPower = 0.5 * (theSignalPower + g.noiseVariance());
-    const double aRms = s.mRmsDn * static_cast<double>(1 << (s.mCodeBits - 5));
+    const double aRms = s.mArchive == CSimArchive::Asar ? 1.0 : s.mRmsDn * static_cast<double>(1 << (s.mCodeBits - 5));
     return aComponentPower > 0.0 ? aRms / std::sqrt(aComponentPower) : 1.0;
 }
 
 /// The sink of the chain's raw raster: each record's prefix and samples through CRasterFile.
 CRecordSink rasterSink(const CSimScene& s, const CSimTimeline& tl, CRasterFile& theRaster)
 {
-    const int aBytes = s.mSamples * (s.mFormat == CSimSampleFormat::Ubyte5Bit ? 2 : 8);
+    const int aBytes = lineBytes(s);
     auto aPixels = std::make_shared<std::vector<uint8_t>>(static_cast<std::size_t>(aBytes));
     auto aPrefix = std::make_shared<std::vector<uint8_t>>(static_cast<std::size_t>(s.mPrefix.mSize));
     return [&s, &tl, &theRaster, aPixels, aPrefix, aBytes](const CSimRecord& r, std::size_t theIndex, const uint8_t* theSamples) {
@@ -284,11 +295,43 @@ CSimRunReport runAlos(const CSimScene& theScene, const std::string& theRoot, con
     return aReport;
 }
 
+/// An ASAR product: the instrument and orbit files and the noise packets first, then a packet per
+/// record, the truth file, and the product renamed into place last.
+CSimRunReport runAsar(const CSimScene& theScene, const std::string& theRoot, const CSimProgress& theProgress)
+{
+    const auto aStart = std::chrono::steady_clock::now();
+    CSimRunReport aReport;
+    aReport.mRaster = fqorvSimAsarPath(theRoot).string();
+    aReport.mTruth = theRoot + "_truth.json";
+    countTargets(theScene, aReport);
+    std::remove(aReport.mTruth.c_str());
+
+    const std::unique_ptr<CSimOrbit> aOrbit = fqorvSimMakeOrbit(theScene);
+    const CSimTimeline aTimeline(theScene);
+    const CSimEchoGenerator aGenerator(theScene, *aOrbit, aTimeline);
+    const CSimSceneTruth aTruth = fqorvSimComputeTruth(theScene, *aOrbit, aTimeline);
+    CSimAsarScene aProduct(theScene, aTimeline, *aOrbit, aTruth, theRoot);
+    CSimRunFigures aFigures;
+    const CRecordSink aSink = [&](const CSimRecord& r, std::size_t, const uint8_t* theBlocks) {
+        aProduct.writeRecord(r, theBlocks);
+    };
+    writeRecordsWith(theScene, aTimeline, aGenerator, aSink, aReport, aFigures, theProgress);
+
+    aFigures.mRasterName = aProduct.productPath().filename().string();
+    CJson aTruthJson = fqorvSimTruthJson(theScene, aTruth, aTimeline, *aOrbit, aFigures);
+    aProduct.addTruth(aTruthJson, aFigures.mGain);
+    aTruthJson.dumpFile(aReport.mTruth);
+    aProduct.finish();
+    aReport.mSeconds = secondsSince(aStart);
+    return aReport;
+}
+
 }  // namespace
 
 CSimRunReport fqorvSimRun(const CSimScene& theScene, const std::string& theRoot, const CSimProgress& theProgress)
 {
     if (theScene.mArchive == CSimArchive::Alos) return runAlos(theScene, theRoot, theProgress);
+    if (theScene.mArchive == CSimArchive::Asar) return runAsar(theScene, theRoot, theProgress);
     if (theScene.mArchive != CSimArchive::Raw) return runNative(theScene, theRoot, theProgress);
     const auto aStart = std::chrono::steady_clock::now();
     CSimRunReport aReport;

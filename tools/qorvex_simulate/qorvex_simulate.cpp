@@ -75,6 +75,8 @@ int main(int argc, char** argv)
             std::printf("raster   %s\nheader   %s\ntruth    %s\n", r.mRaster.c_str(), r.mHeader.c_str(), r.mTruth.c_str());
         else
             std::printf("archive  %s\ntruth    %s\n", r.mRaster.c_str(), r.mTruth.c_str());
+        if (aScene.mArchive == CSimArchive::Asar)
+            std::printf("outside  %s_ASA_INS_AX %s_DOR_VOR_AX\n", aCommand.mRoot.c_str(), aCommand.mRoot.c_str());
         std::printf("%s: %ld pulses, %ld records x %d samples, %zu targets, %zu scatterers\n",
                     aScene.mRadar.mSensorName.c_str(), r.mPulses, r.mRecords, aScene.mSamples, r.mTargets,
                     r.mScatterers);
@@ -82,7 +84,8 @@ int main(int argc, char** argv)
             std::printf("%d-bit gain %.4f codes/unit, clipped %.4f%% of components\n", aScene.mCodeBits, r.mGain,
                         100.0 * r.mClippedFraction);
         else
-            std::printf("4-bit BAQ, %.4f%% of components beyond the outermost level\n", 100.0 * r.mClippedFraction);
+            std::printf("%s, %.4f%% of components beyond the outermost level\n",
+                        aScene.mArchive == CSimArchive::Asar ? "FBAQ 8:4" : "4-bit BAQ", 100.0 * r.mClippedFraction);
         std::printf("%.2f s (echoes %.2f s, %d threads)\n", r.mSeconds, r.mEchoSeconds, r.mThreads);
     } catch (const std::exception& e) {
         std::fprintf(stderr, "qorvex_simulate: %s\n", e.what());
