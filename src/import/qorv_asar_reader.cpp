@@ -52,7 +52,6 @@ constexpr int CQORV_ASAR_SAMPLES = 68;             // the first FBAQ block
 constexpr uint32_t CQORV_ASAR_MIN_ISP_LENGTH = 30;  // the data field header and the first block's id
 constexpr int CQORV_ASAR_FBAQ_8_4 = 1;             // the compression code of FBAQ 8:4
 
-constexpr std::size_t CQORV_SCAN_CHUNK = 1 << 20;
 constexpr double CQORV_ORBIT_MARGIN = 300.0;       // s of orbit kept before and after the scene
 
 /// Microseconds since 2000-01-01 00:00:00 UTC of a day number (days since 1970-01-01).
@@ -329,35 +328,29 @@ std::vector<CRecordCodes> fqorvScanAsarPackets(int theFd, const CNativeRecordLay
     std::vector<CRecordCodes> aCodes;
     aCodes.reserve(static_cast<std::size_t>(std::min<uint64_t>(aLimit, (aEnd - std::min(aEnd, aFirst)) / 1000 + 1)));
 
-    // Big reads from the page cache; each packet's header is taken where it lies in the chunk, and
-    // a chunk is read anew from the first packet whose header it does not hold whole.
-    std::vector<uint8_t> aChunk(CQORV_SCAN_CHUNK);
-    uint64_t aChunkStart = 0, aChunkEnd = 0;
+    // One read of the header per packet: the page cache serves it without copying the samples,
+    // which make up 99 % of the packet (a walk that reads the file in big chunks and takes the
+    // headers from them copies every byte and takes twice as long).
+    uint8_t aHeader[CQORV_ASAR_SAMPLES];
     uint64_t aAt = aFirst;
     int aPercent = -1;
     while (aAt < aEnd && aCodes.size() < aLimit) {
         const uint64_t i = aCodes.size();
-        if (aAt + CQORV_ASAR_SAMPLES > aChunkEnd) {
-            if (aAt + CQORV_ASAR_SAMPLES > aEnd)
-                failPacket(theLayout, i, aAt, "has " + std::to_string(aEnd - aAt) + " bytes left in the file, less than its header");
-            const std::size_t aCount = static_cast<std::size_t>(std::min<uint64_t>(CQORV_SCAN_CHUNK, aEnd - aAt));
-            if (!fqorvReadAt(theFd, aAt, aChunk.data(), aCount))
-                fqorvImportFail(CQORV_ERR_RASTER_READ, theLayout.mDataFile.string() + ": " + std::to_string(aCount) + " bytes at " +
-                                                           std::to_string(aAt) + " can't be read" +
-                                                           (errno != 0 ? std::string(": ") + std::strerror(errno) : std::string()));
-            aChunkStart = aAt;
-            aChunkEnd = aAt + aCount;
-        }
-        const uint8_t* p = aChunk.data() + (aAt - aChunkStart);
-        const uint32_t aIspLength = fqorvBigEndianU16(p + CQORV_ASAR_LENGTH);
+        if (aAt + CQORV_ASAR_SAMPLES > aEnd)
+            failPacket(theLayout, i, aAt, "has " + std::to_string(aEnd - aAt) + " bytes left in the file, less than its header");
+        if (!fqorvReadAt(theFd, aAt, aHeader, sizeof aHeader))
+            fqorvImportFail(CQORV_ERR_RASTER_READ, theLayout.mDataFile.string() + ": packet " + std::to_string(i) + " at byte " +
+                                                       std::to_string(aAt) + " can't be read" +
+                                                       (errno != 0 ? std::string(": ") + std::strerror(errno) : std::string()));
+        const uint32_t aIspLength = fqorvBigEndianU16(aHeader + CQORV_ASAR_LENGTH);
         if (aIspLength < CQORV_ASAR_MIN_ISP_LENGTH)
             failPacket(theLayout, i, aAt, "states an ISP length of " + std::to_string(aIspLength) + " bytes, less than " +
                                               std::to_string(CQORV_ASAR_MIN_ISP_LENGTH));
-        const CRecordCodes c = codesOfPacket(p, aAt);
+        const CRecordCodes c = codesOfPacket(aHeader, aAt);
         if (aAt + c.mLength > aEnd)
             failPacket(theLayout, i, aAt, "of " + std::to_string(c.mLength) + " bytes runs past the end of the file at byte " +
                                               std::to_string(aEnd));
-        const uint16_t aMode = fqorvBigEndianU16(p + CQORV_ASAR_MODE);
+        const uint16_t aMode = fqorvBigEndianU16(aHeader + CQORV_ASAR_MODE);
         if (c.mEcho && aMode != CQORV_ASAR_IMAGE_MODE)
             failPacket(theLayout, i, aAt, "is an echo of the mode " + hex(aMode) + ", not of image mode (" + hex(CQORV_ASAR_IMAGE_MODE) + ")");
         aCodes.push_back(c);
@@ -365,6 +358,8 @@ std::vector<CRecordCodes> fqorvScanAsarPackets(int theFd, const CNativeRecordLay
         const int aNow = static_cast<int>((aAt - aFirst) * 100 / (aEnd - aFirst));
         if (theProgress && aNow != aPercent) theProgress(aPercent = aNow);
     }
+    // The declared packets may end before the file does.
+    if (theProgress && aPercent != 100) theProgress(100);
     return aCodes;
 }
 
