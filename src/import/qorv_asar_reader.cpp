@@ -165,31 +165,69 @@ bool validityOf(const fs::path& theFile, long theReferenceDay, double& theStart,
     }
 }
 
+/// The outside files a product's data set descriptors name (their FILENAME: the products used
+/// when it was made).
+std::vector<std::string> namedFiles(const CEnvisatHeaders& theHeaders)
+{
+    std::vector<std::string> aNames;
+    for (const CEnvisatKeyValues& aDsd : theHeaders.descriptors())
+        if (aDsd.has("FILENAME") && !aDsd.text("FILENAME").empty()) aNames.push_back(aDsd.text("FILENAME"));
+    return aNames;
+}
+
+/// Characters that the names of two files share at their start.
+std::size_t commonStart(const std::string& a, const std::string& b)
+{
+    std::size_t n = 0;
+    while (n < a.size() && n < b.size() && a[n] == b[n]) ++n;
+    return n;
+}
+
 /// The product beside theProduct of the kind thePrefix ("ASA_INS_AX") that applies from theStart
-/// to theStop: the only one there, else the newest (the last by name) of those whose validity
-/// covers that time. An empty path when there is none; 979212 when several are there and none
-/// applies.
-fs::path besideOfKind(const fs::path& theProduct, const std::string& thePrefix, long theReferenceDay, double theStart,
-                      double theStop)
+/// to theStop: the only one there; else among those theNamed names (the product's descriptors),
+/// or all when it names none of them, those whose validity covers that time, and of these the one
+/// whose name shares the longest start with the product's (a simulated scene and its files), then
+/// the last by name (the newest). An empty path when there is none; 979212 when several are there
+/// and none applies.
+fs::path besideOfKind(const fs::path& theProduct, const std::string& thePrefix, const std::vector<std::string>& theNamed,
+                      long theReferenceDay, double theStart, double theStop)
 {
     const fs::path aDirectory = theProduct.has_parent_path() ? theProduct.parent_path() : fs::path(".");
-    std::vector<fs::path> aFound;
+    std::vector<fs::path> aFound, aNamed;
     std::error_code aError;
     for (const fs::directory_entry& aEntry : fs::directory_iterator(aDirectory, aError)) {
         if (!aEntry.is_regular_file(aError) || fs::equivalent(aEntry.path(), theProduct, aError)) continue;
-        if (fqorvEnvisatProductName(aEntry.path()).rfind(thePrefix, 0) == 0) aFound.push_back(aEntry.path());
+        const std::string aProduct = fqorvEnvisatProductName(aEntry.path());
+        if (aProduct.rfind(thePrefix, 0) != 0) continue;
+        aFound.push_back(aEntry.path());
+        for (const std::string& aName : theNamed)
+            if (aName == aProduct || aName == aEntry.path().filename().string()) aNamed.push_back(aEntry.path());
     }
-    std::sort(aFound.begin(), aFound.end());
     if (aFound.size() <= 1) return aFound.empty() ? fs::path() : aFound.front();
+    std::sort(aFound.begin(), aFound.end());
+    std::sort(aNamed.begin(), aNamed.end());
+    const std::vector<fs::path>& aCandidates = aNamed.empty() ? aFound : aNamed;
+    const std::string aOwn = theProduct.filename().string();
+    fs::path aBest;
     std::string aNames;
-    for (auto i = aFound.rbegin(); i != aFound.rend(); ++i) {
+    for (const fs::path& aFile : aCandidates) {
+        aNames += (aNames.empty() ? "" : ", ") + aFile.filename().string();
         double aStart = NAN, aStop = NAN;
-        if (validityOf(*i, theReferenceDay, aStart, aStop) && aStart <= theStart && aStop >= theStop) return *i;
-        aNames = i->filename().string() + (aNames.empty() ? "" : ", ") + aNames;
+        if (!validityOf(aFile, theReferenceDay, aStart, aStop) || aStart > theStart || aStop < theStop) continue;
+        const std::string aName = aFile.filename().string();
+        if (aBest.empty()) {
+            aBest = aFile;
+            continue;
+        }
+        const std::string aBestName = aBest.filename().string();
+        const std::size_t aCommon = commonStart(aName, aOwn), aBestCommon = commonStart(aBestName, aOwn);
+        if (aCommon > aBestCommon || (aCommon == aBestCommon && aName > aBestName)) aBest = aFile;
     }
-    fqorvImportFail(CQORV_ERR_IMPORT_OUTSIDE_FILE, "none of the " + thePrefix + " products beside " + theProduct.string() + " (" +
-                                                       aNames + ") applies to its sensing time: give one with " +
-                                                       (thePrefix == "DOR_VOR_AX" ? "--orbit FILE" : "--aux FILE"));
+    if (aBest.empty())
+        fqorvImportFail(CQORV_ERR_IMPORT_OUTSIDE_FILE, "none of the " + thePrefix + " products beside " + theProduct.string() + " (" +
+                                                           aNames + ") applies to its sensing time: give one with " +
+                                                           (thePrefix == "DOR_VOR_AX" ? "--orbit FILE" : "--aux FILE"));
+    return aBest;
 }
 
 std::string timeText(long theReferenceDay, double theSeconds)
@@ -200,10 +238,11 @@ std::string timeText(long theReferenceDay, double theSeconds)
 }
 
 /// The instrument file given, or the one beside the product.
-CAsarInstrument readInstrument(const CNativeOutsideFiles& theOutside, CNativeArchive& a)
+CAsarInstrument readInstrument(const CNativeOutsideFiles& theOutside, const std::vector<std::string>& theNamed, CNativeArchive& a)
 {
     fs::path aFile = theOutside.mInstrument;
-    if (aFile.empty()) aFile = besideOfKind(a.mFiles.front(), "ASA_INS_AX", a.mReferenceDay, a.mSensingStart, a.mSensingStart);
+    if (aFile.empty())
+        aFile = besideOfKind(a.mFiles.front(), "ASA_INS_AX", theNamed, a.mReferenceDay, a.mSensingStart, a.mSensingStart);
     if (aFile.empty())
         fqorvImportFail(CQORV_ERR_IMPORT_OUTSIDE_FILE, a.mFiles.front().string() +
                                                            ": an ASAR level 0 product needs its instrument file ASA_INS_AX "
@@ -220,10 +259,11 @@ CAsarInstrument readInstrument(const CNativeOutsideFiles& theOutside, CNativeArc
 
 /// The orbit: an orbit file's vectors around the scene. The product's own single vector is only
 /// noted: a precise orbit is what the scene needs.
-void readOrbit(const CNativeOutsideFiles& theOutside, const CEnvisatKeyValues& theMph, double theSensingStop, CNativeArchive& a)
+void readOrbit(const CNativeOutsideFiles& theOutside, const std::vector<std::string>& theNamed, const CEnvisatKeyValues& theMph,
+               double theSensingStop, CNativeArchive& a)
 {
     fs::path aFile = theOutside.mOrbit;
-    if (aFile.empty()) aFile = besideOfKind(a.mFiles.front(), "DOR_VOR_AX", a.mReferenceDay, a.mSensingStart, theSensingStop);
+    if (aFile.empty()) aFile = besideOfKind(a.mFiles.front(), "DOR_VOR_AX", theNamed, a.mReferenceDay, a.mSensingStart, theSensingStop);
     if (aFile.empty())
         fqorvImportFail(CQORV_ERR_IMPORT_OUTSIDE_FILE, a.mFiles.front().string() +
                                                            ": an ASAR level 0 product needs a precise orbit, DOR_VOR_AX (none lies "
@@ -377,8 +417,9 @@ CNativeArchive fqorvReadAsarEnvisat(const fs::path& theFile, const CNativeOutsid
     std::vector<uint8_t> aEchoHeader(CQORV_ASAR_SAMPLES);
     CNativeRecordFile(a.mLayout).readBytes(aFirstEcho.mOffset, aEchoHeader.size(), aEchoHeader.data());
     readBeamSet(aEchoHeader.data(), aHeaders.mSph, a);
-    readRadarValues(aEchoHeader.data(), readInstrument(theOutside, a), a);
-    readOrbit(theOutside, aHeaders.mMph, aSensingStop, a);
+    const std::vector<std::string> aNamed = namedFiles(aHeaders);
+    readRadarValues(aEchoHeader.data(), readInstrument(theOutside, aNamed, a), a);
+    readOrbit(theOutside, aNamed, aHeaders.mMph, aSensingStop, a);
     fqorvCheckStatedValues(a);
     return a;
 }

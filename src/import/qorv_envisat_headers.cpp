@@ -85,7 +85,7 @@ double CEnvisatKeyValues::time(const std::string& theKey, long theReferenceDay) 
     return static_cast<double>(aDate.dayNumber() - theReferenceDay) * 86400.0 + aDate.secondsOfDay();
 }
 
-CEnvisatKeyValues CEnvisatHeaders::descriptor(const std::string& theName) const
+std::vector<CEnvisatKeyValues> CEnvisatHeaders::descriptors() const
 {
     const int64_t aCount = mMph.integer("NUM_DSD");
     const int64_t aSize = mMph.integer("DSD_SIZE");
@@ -96,12 +96,19 @@ CEnvisatKeyValues CEnvisatHeaders::descriptor(const std::string& theName) const
                                                     std::to_string(aSize) + " bytes do not fit a specific product header of " +
                                                     std::to_string(aSphSize));
     const int64_t aFirst = static_cast<int64_t>(CQORV_ENVISAT_MPH_BYTES) + aSphSize - aCount * aSize;
+    std::vector<CEnvisatKeyValues> aDescriptors;
     for (int64_t i = 0; i < aCount; ++i) {
         const std::size_t aBegin = static_cast<std::size_t>(aFirst + i * aSize);
-        const CEnvisatKeyValues aDsd(mBytes, aBegin, aBegin + static_cast<std::size_t>(aSize),
-                                     mFile + " data set descriptor " + std::to_string(i + 1));
-        if (aDsd.has("DS_NAME") && aDsd.text("DS_NAME") == theName) return aDsd;
+        aDescriptors.emplace_back(mBytes, aBegin, aBegin + static_cast<std::size_t>(aSize),
+                                  mFile + " data set descriptor " + std::to_string(i + 1));
     }
+    return aDescriptors;
+}
+
+CEnvisatKeyValues CEnvisatHeaders::descriptor(const std::string& theName) const
+{
+    for (const CEnvisatKeyValues& aDsd : descriptors())
+        if (aDsd.has("DS_NAME") && aDsd.text("DS_NAME") == theName) return aDsd;
     fqorvImportFail(CQORV_ERR_IMPORT_VALUE, mFile + " has no data set " + theName);
 }
 

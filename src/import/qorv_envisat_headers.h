@@ -54,6 +54,8 @@ struct CEnvisatHeaders {
 
     /// Byte of the file where the headers end and the first data set usually begins.
     uint64_t headersEnd() const { return CQORV_ENVISAT_MPH_BYTES + mSphSize; }
+    /// Every data set descriptor; 979210 when their count and size do not fit the SPH.
+    std::vector<CEnvisatKeyValues> descriptors() const;
     /// The data set descriptor whose DS_NAME is theName; 979210 when there is none.
     CEnvisatKeyValues descriptor(const std::string& theName) const;
 };

@@ -125,10 +125,20 @@ struct CAsarFixture {
             append(mProduct, block("DS_NAME=\"" + std::string(aName) + "\"\nDS_TYPE=R\n", 280));
         for (std::size_t k = 0; k < PACKETS.size(); ++k) append(mProduct, packet(static_cast<int>(k), PACKETS[k].mFlags, PACKETS[k].mBytes));
 
-        mInstrument = auxiliaryHeaders("ASA_INS_AXVIEC20040101_000000_20030101_000000_20051231_000000",
-                                       "01-JAN-2003 00:00:00.000000", "31-DEC-2005 00:00:00.000000");
+        mInstrument = instrument("01-JAN-2003 00:00:00.000000", "31-DEC-2005 00:00:00.000000", 5.331e9f);
+
+        // Four hours of vectors a minute apart, from 08:00.
+        mOrbit = auxiliaryHeaders("DOR_VOR_AXVF-P20040303_000000_20040301_080000_20040301_120000",
+                                  "01-MAR-2004 08:00:00.000000", "01-MAR-2004 12:00:00.000000");
+        for (int m = 0; m <= 240; ++m) append(mOrbit, dorisRecord(m));
+    }
+
+    /// An instrument file valid from theStart to theStop.
+    static Bytes instrument(const std::string& theStart, const std::string& theStop, float theCarrier)
+    {
+        Bytes aFile = auxiliaryHeaders("ASA_INS_AXVIEC20040101_000000_20030101_000000_20051231_000000", theStart, theStop);
         Bytes aData(INSTRUMENT_BYTES, 0);
-        putFloat(aData, 16, 5.331e9f);
+        putFloat(aData, 16, theCarrier);
         putFloat(aData, 20, static_cast<float>(FS));
         putFloat(aData, 69912, 5.5e-7f);
         for (int k = 0; k < 4096; ++k) {
@@ -136,12 +146,8 @@ struct CAsarFixture {
             putFloat(aData, 103328 + 4 * static_cast<std::size_t>(k), tableQ(k));
         }
         for (int k = 0; k < 7; ++k) putU16(aData, 161594 + 2 * (14 + static_cast<std::size_t>(k)), static_cast<uint16_t>(RANK[k]));
-        append(mInstrument, aData);
-
-        // Four hours of vectors a minute apart, from 08:00.
-        mOrbit = auxiliaryHeaders("DOR_VOR_AXVF-P20040303_000000_20040301_080000_20040301_120000",
-                                  "01-MAR-2004 08:00:00.000000", "01-MAR-2004 12:00:00.000000");
-        for (int m = 0; m <= 240; ++m) append(mOrbit, dorisRecord(m));
+        append(aFile, aData);
+        return aFile;
     }
 
     /// The vector of minute m from 08:00: positions and velocities that tell the minute.
@@ -174,11 +180,13 @@ TEST(AsarReader, ProductAndItsOutsideFilesReadBack)
 {
     qtest::TempDir aTemp;
     const CAsarFixture f;
-    // Beside the product under names that say nothing, and apart, given by name.
+    // Beside the product under names that say nothing (with an instrument file of other years,
+    // last by name), and apart, given by name.
     fs::create_directories(aTemp / "beside");
     fs::create_directories(aTemp / "apart");
     writeBytes(aTemp / "beside/p", f.mProduct);
     writeBytes(aTemp / "beside/i", f.mInstrument);
+    writeBytes(aTemp / "beside/z", CAsarFixture::instrument("01-JAN-2006 00:00:00.000000", "31-DEC-2007 00:00:00.000000", 5.3e9f));
     writeBytes(aTemp / "beside/o", f.mOrbit);
     writeBytes(aTemp / "apart/p", f.mProduct);
     const CNativeOutsideFiles aGiven{aTemp / "beside/i", aTemp / "beside/o"};
@@ -271,6 +279,10 @@ TEST(AsarReader, MissingOrWrongOutsideFilesAndBrokenPacketsAreRefused)
          "is the product DOR_VOR_AX"},
         {"rank out of range", [](CAsarFixture& f, CNativeOutsideFiles&, const fs::path&) { putU16(f.mInstrument, 1625 + 161594 + 30, 0); },
          979213, "a rank of 0 for the beam set IS2"},
+        {"no instrument file that applies", [](CAsarFixture& f, CNativeOutsideFiles&, const fs::path& d) {
+             f.mInstrument = CAsarFixture::instrument("01-JAN-2006 00:00:00.000000", "31-DEC-2007 00:00:00.000000", 5.331e9f);
+             writeBytes(d / "j", f.mInstrument);
+         }, 979212, "none of the ASA_INS_AX products beside"},
         {"no orbit file", [](CAsarFixture& f, CNativeOutsideFiles&, const fs::path&) { f.mOrbit.clear(); }, 979212,
          "needs a precise orbit, DOR_VOR_AX (none lies beside it): give it with --orbit FILE"},
         {"instrument given as orbit", [](CAsarFixture&, CNativeOutsideFiles& o, const fs::path& d) { o.mOrbit = d / "i"; }, 979213,
