@@ -317,10 +317,17 @@ void readRadarValues(const uint8_t* theHeader, const CAsarInstrument& theInstrum
     a.mRank = theInstrument.mRank[static_cast<std::size_t>(a.mBeamSet - 1)];
 
     const double fs = a.mSamplingRate;
-    a.mPulseLength = (fqorvBigEndianU16(theHeader + CQORV_ASAR_PULSE) >> 6) / fs;
-    a.mBandwidth = theHeader[CQORV_ASAR_BANDWIDTH] * NQORV_ASAR::BANDWIDTH_UNIT;
+    const int aPulse = fqorvBigEndianU16(theHeader + CQORV_ASAR_PULSE) >> 6;
+    const int aBandwidth = theHeader[CQORV_ASAR_BANDWIDTH];
+    const int aPri = fqorvBigEndianU16(theHeader + CQORV_ASAR_PRI);
+    if (aPulse == 0 || aBandwidth == 0 || aPri == 0)
+        fqorvImportFail(CQORV_ERR_IMPORT_VALUE, a.mFiles.front().filename().string() + ": the first echo packet states a pulse code of " +
+                                                    std::to_string(aPulse) + ", a bandwidth code of " + std::to_string(aBandwidth) +
+                                                    " and a PRI code of " + std::to_string(aPri) + ": none may be 0");
+    a.mPulseLength = aPulse / fs;
+    a.mBandwidth = aBandwidth * NQORV_ASAR::BANDWIDTH_UNIT;
     a.mChirpRate = a.mBandwidth / a.mPulseLength;   // the image mode chirp rises
-    a.mPrf = fs / fqorvBigEndianU16(theHeader + CQORV_ASAR_PRI);
+    a.mPrf = fs / aPri;
 }
 
 // ------------------------------------------------------------------------------------------------
