@@ -277,6 +277,7 @@ void readOrbit(const CNativeOutsideFiles& theOutside, const std::vector<std::str
         if (v.mTime >= a.mSensingStart - CQORV_ORBIT_MARGIN && v.mTime <= theSensingStop + CQORV_ORBIT_MARGIN) aNear.push_back(v);
     a.mStateVectors = aNear.size() >= 4 ? aNear : aAll;
 
+    if (!theMph.has("STATE_VECTOR_TIME") || !theMph.has("VECTOR_SOURCE")) return;
     const CStateVector aOwn = fqorvEnvisatStateVector(theMph, a.mReferenceDay);
     a.mNotes.push_back("the main product header's one state vector (" + theMph.text("VECTOR_SOURCE") + ", " +
                        timeText(a.mReferenceDay, aOwn.mTime) + ") is not used: " + std::to_string(a.mStateVectors.size()) +
