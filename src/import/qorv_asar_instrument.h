@@ -3,6 +3,7 @@
 // the range gate bias, the FBAQ decoding tables and the image mode timeline (which gives the rank,
 // the pulses in flight, of each beam set).
 //
+// The main product header's SENSING_START and SENSING_STOP give the period the file applies to.
 // Offsets within the data set (it starts behind the main and specific product headers,
 // 1247 + SPH_SIZE, and is NQORV_ASAR::INSTRUMENT_FILE_SIZE bytes long); all big-endian:
 //   16      float radar frequency, Hz
@@ -36,7 +37,9 @@ struct CAsarInstrument {
 bool fqorvIsAsarInstrumentFile(const std::filesystem::path& theFile);
 
 /// Reads an instrument file, its times counted from the midnight of theReferenceDay. CImportFailure
-/// 261122 when it does not exist, 979213 when it is not an ASA_INS_AX product, its data set is not
-/// NQORV_ASAR::INSTRUMENT_FILE_SIZE bytes, or a value it gives is impossible (a frequency outside
-/// C band, a sampling rate outside 1 .. 100 MHz, a table value not finite, a rank outside 1 .. 15).
+/// 261122 when it does not exist, 979213 when it is not an ASA_INS_AX product, its headers can't
+/// be read, its data set is not NQORV_ASAR::INSTRUMENT_FILE_SIZE bytes (the file ends there), or a
+/// value it gives is impossible (a frequency outside C band, 4 .. 8 GHz, a sampling rate outside
+/// 1 .. 100 MHz, a range gate bias of 100 us or more, a table value not finite, a rank outside
+/// 1 .. 15).
 CAsarInstrument fqorvReadAsarInstrument(const std::filesystem::path& theFile, long theReferenceDay);

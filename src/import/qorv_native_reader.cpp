@@ -17,6 +17,7 @@
 #include <vector>
 
 #include "qorv_ceos_records.h"
+#include "qorv_envisat_headers.h"
 #include "qorv_generic_utility.h"
 #include "qorv_import_failure.h"
 #include "qorv_native_formats.h"
@@ -494,8 +495,13 @@ CNativeArchive fqorvReadNativeArchive(const fs::path& theInput, const CNativeOut
         const CNativeFileClass aClass = fqorvClassifyNativeFile(theInput);
         switch (aClass.mKind) {
         case ENativeFileKind::Envisat:
-            aArchive = fqorvReadErsEnvisat(theInput);
-            (void)theOutside;
+            // ASAR image mode level 0 (ASA_IM__0P, and its consolidated form ASA_IM__0C) has packets
+            // and outside files of its own; every other product goes to the ERS reader, which
+            // refuses what is not ERS level 0.
+            if (fqorvEnvisatProductName(theInput).rfind("ASA_IM__0", 0) == 0)
+                aArchive = fqorvReadAsarEnvisat(theInput, theOutside);
+            else
+                aArchive = fqorvReadErsEnvisat(theInput);
             break;
         case ENativeFileKind::CeosLeader: {
             if (isAlos(aClass)) {

@@ -31,8 +31,9 @@ struct CNativeOutsideFiles {
 /// leader beside it or an ALOS image file without an ALOS leader, 979203 for record lengths that
 /// contradict the file descriptor, 979204 for a record layout of no known facility, 979206 for
 /// state vectors whose times go backwards, 979210 for a missing or impossible value.
-/// theOutside: the outside files given (an ASAR product needs its instrument file: 979212 when
-/// none is given or found beside it, 979213 for a file of another kind or size).
+/// theOutside: the outside files given (an ASAR product needs its instrument file and a DORIS
+/// orbit: 979212 when one is neither given nor found beside it, 979213 for a file of another kind
+/// or size).
 CNativeArchive fqorvReadNativeArchive(const std::filesystem::path& theInput, const CNativeOutsideFiles& theOutside = {});
 
 /// Every product theInput holds: one for an ERS or ENVISAT-format input or an ALOS image file;

@@ -1,6 +1,8 @@
-// Outside orbit files: one state vector a line, UTC times turned into seconds from a reference day.
+// Outside orbit files: the plain table and the DORIS orbit, UTC times turned into seconds from a
+// reference day.
 #include "qorv_orbit_file.h"
 
+#include <algorithm>
 #include <charconv>
 #include <cmath>
 #include <fstream>
@@ -9,7 +11,9 @@
 #include <system_error>
 
 #include "qorv_date.h"
+#include "qorv_envisat_headers.h"
 #include "qorv_import_failure.h"
+#include "qorv_native_formats.h"
 
 namespace {
 
@@ -97,20 +101,50 @@ bool parseVector(std::string_view theLine, long theReferenceDay, CStateVector& t
     return true;
 }
 
-}  // namespace
+/// The vectors of a file in their order, with the checks both kinds of file share: times that
+/// increase strictly, enough vectors for the interpolation.
+class CVectorList {
+public:
+    explicit CVectorList(const std::filesystem::path& thePath) : mPath(thePath) {}
 
-std::vector<CStateVector> fqorvReadOrbitFile(const std::filesystem::path& thePath, long theReferenceDay)
+    /// Adds the vector of line or record theNumber (theUnit says which).
+    void add(const CStateVector& theVector, const char* theUnit, long theNumber)
+    {
+        if (!mVectors.empty() && !(theVector.mTime > mVectors.back().mTime)) {
+            fqorvImportFail(CQORV_ERR_IMPORT_TIME_ORDER, mPath.string() + " " + theUnit + " " + std::to_string(theNumber) +
+                                                             ": its time is not after that of " + theUnit + " " +
+                                                             std::to_string(mPrevious));
+        }
+        mVectors.push_back(theVector);
+        mPrevious = theNumber;
+    }
+
+    std::vector<CStateVector> finish()
+    {
+        if (mVectors.size() < static_cast<std::size_t>(kMinimumVectors)) {
+            fqorvImportFail(CQORV_ERR_IMPORT_ORBIT_FILE, mPath.string() + " holds " + std::to_string(mVectors.size()) +
+                                                             " state vectors, at least " + std::to_string(kMinimumVectors) +
+                                                             " are needed");
+        }
+        return std::move(mVectors);
+    }
+
+private:
+    std::filesystem::path mPath;
+    std::vector<CStateVector> mVectors;
+    long mPrevious = 0;
+};
+
+std::vector<CStateVector> readPlainTable(const std::filesystem::path& thePath, long theReferenceDay)
 {
-    std::error_code aError;
-    if (!std::filesystem::exists(thePath, aError)) fqorvImportFail(CQORV_ERR_MISSING_FILE, thePath.string());
     std::ifstream aFile(thePath);
+    std::error_code aError;
     if (!aFile || std::filesystem::is_directory(thePath, aError)) {
         fqorvImportFail(CQORV_ERR_IMPORT_ORBIT_FILE, thePath.string() + " cannot be opened");
     }
-
-    std::vector<CStateVector> aVectors;
+    CVectorList aVectors(thePath);
     std::string aLine;
-    long aLineNumber = 0, aPreviousLine = 0;
+    long aLineNumber = 0;
     while (std::getline(aFile, aLine)) {
         ++aLineNumber;
         if (!aLine.empty() && aLine.back() == '\r') aLine.pop_back();  // written on Windows
@@ -122,19 +156,87 @@ std::vector<CStateVector> fqorvReadOrbitFile(const std::filesystem::path& thePat
             fqorvImportFail(CQORV_ERR_IMPORT_ORBIT_FILE, thePath.string() + " line " + std::to_string(aLineNumber) +
                                                              " is not a time and six numbers: " + quotedLine(aLine));
         }
-        if (!aVectors.empty() && !(v.mTime > aVectors.back().mTime)) {
-            fqorvImportFail(CQORV_ERR_IMPORT_TIME_ORDER, thePath.string() + " line " + std::to_string(aLineNumber) +
-                                                             ": its time is not after that of line " +
-                                                             std::to_string(aPreviousLine));
-        }
-        aVectors.push_back(v);
-        aPreviousLine = aLineNumber;
+        aVectors.add(v, "line", aLineNumber);
     }
     if (aFile.bad()) fqorvImportFail(CQORV_ERR_IMPORT_ORBIT_FILE, thePath.string() + " cannot be read");
-    if (aVectors.size() < static_cast<std::size_t>(kMinimumVectors)) {
-        fqorvImportFail(CQORV_ERR_IMPORT_ORBIT_FILE, thePath.string() + " holds " + std::to_string(aVectors.size()) +
-                                                         " state vectors, at least " + std::to_string(kMinimumVectors) +
-                                                         " are needed");
+    return aVectors.finish();
+}
+
+/// One DORIS record: the time, then dUT1, x y z, vx vy vz and a quality text; false unless the
+/// time and the seven numbers parse.
+bool parseDorisRecord(std::string_view theRecord, long theReferenceDay, CStateVector& theVector)
+{
+    constexpr std::size_t CQORV_TIME_CHARACTERS = 27;   // DD-MMM-YYYY hh:mm:ss.uuuuuu
+    if (theRecord.size() <= CQORV_TIME_CHARACTERS || theRecord[CQORV_TIME_CHARACTERS] != ' ') return false;
+    CQorvDate aDate;
+    if (!aDate.parse(std::string(theRecord.substr(0, CQORV_TIME_CHARACTERS)).c_str())) return false;
+    theVector.mTime = static_cast<double>(aDate.dayNumber() - theReferenceDay) * 86400.0 + aDate.secondsOfDay();
+    double aNumbers[7];
+    std::size_t aAt = CQORV_TIME_CHARACTERS;
+    for (double& aNumber : aNumbers) {
+        aAt = theRecord.find_first_not_of(' ', aAt);
+        if (aAt == std::string_view::npos) return false;
+        const std::size_t aEnd = std::min(theRecord.find(' ', aAt), theRecord.size());
+        if (!parseDouble(theRecord.substr(aAt, aEnd - aAt), aNumber)) return false;
+        aAt = aEnd;
     }
-    return aVectors;
+    for (int i = 0; i < 3; ++i) {
+        theVector.mPosition[i] = aNumbers[1 + i];
+        theVector.mVelocity[i] = aNumbers[4 + i];
+    }
+    return true;
+}
+
+std::vector<CStateVector> readDorisOrbit(const std::filesystem::path& thePath, long theReferenceDay)
+{
+    uint64_t aFirst = 0;
+    try {
+        aFirst = fqorvReadEnvisatHeaders(thePath).headersEnd();
+    } catch (const CImportFailure& e) {
+        if (e.id() != CQORV_ERR_IMPORT_VALUE) throw;
+        fqorvImportFail(CQORV_ERR_IMPORT_ORBIT_FILE, thePath.string() + ": a DORIS orbit whose headers can't be read (" +
+                                                         e.parameter() + ")");
+    }
+    std::error_code aError;
+    const uint64_t aSize = std::filesystem::file_size(thePath, aError);
+    if (aError) fqorvImportFail(CQORV_ERR_IMPORT_ORBIT_FILE, thePath.string() + " cannot be read: " + aError.message());
+    const std::vector<uint8_t> aBytes = fqorvReadFileBytes(thePath, aFirst, aSize > aFirst ? aSize - aFirst : 0);
+    const std::string_view aText(reinterpret_cast<const char*>(aBytes.data()), aBytes.size());
+
+    CVectorList aVectors(thePath);
+    long aRecord = 0;
+    for (std::size_t aAt = 0; aAt < aText.size();) {
+        const std::size_t aEnd = std::min(aText.find('\n', aAt), aText.size());
+        const std::string_view aLine = aText.substr(aAt, aEnd - aAt);
+        const uint64_t aByte = aFirst + aAt;
+        aAt = aEnd + 1;
+        if (aLine.find_first_not_of(" \r") == std::string_view::npos) continue;   // padding at the end
+        ++aRecord;
+        CStateVector v;
+        if (!parseDorisRecord(aLine, theReferenceDay, v)) {
+            fqorvImportFail(CQORV_ERR_IMPORT_ORBIT_FILE, thePath.string() + " record " + std::to_string(aRecord) + " at byte " +
+                                                             std::to_string(aByte) +
+                                                             " is not a time, dUT1 and six numbers: " + quotedLine(aLine));
+        }
+        aVectors.add(v, "record", aRecord);
+    }
+    return aVectors.finish();
+}
+
+}  // namespace
+
+std::vector<CStateVector> fqorvReadOrbitFile(const std::filesystem::path& thePath, long theReferenceDay)
+{
+    std::error_code aError;
+    if (!std::filesystem::exists(thePath, aError)) fqorvImportFail(CQORV_ERR_MISSING_FILE, thePath.string());
+    if (std::filesystem::is_directory(thePath, aError)) {
+        fqorvImportFail(CQORV_ERR_IMPORT_ORBIT_FILE, thePath.string() + " cannot be opened");
+    }
+    const std::string aProduct = fqorvEnvisatProductName(thePath);
+    if (aProduct.rfind("DOR_VOR_AX", 0) == 0) return readDorisOrbit(thePath, theReferenceDay);
+    if (!aProduct.empty()) {
+        fqorvImportFail(CQORV_ERR_IMPORT_OUTSIDE_KIND, thePath.string() + " is the ENVISAT-format product " + aProduct +
+                                                           ", not an orbit (a DORIS orbit DOR_VOR_AX or a table of state vectors)");
+    }
+    return readPlainTable(thePath, theReferenceDay);
 }

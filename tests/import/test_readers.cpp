@@ -418,8 +418,8 @@ TEST(EnvisatReader, ErsProductReadsBackAndItsTrapsAreRefused)
         const char* mWords;
     };
     const CCase aCases[] = {
-        {"ASAR", [](Bytes& b) { b = envisatProduct(2, "ASA_IM__0PNPDE20040101_101010_000000162023_00123_09876_0001.N1"); }, 979201,
-         "ENVISAT ASAR level 0 is not imported yet"},
+        {"ASAR level 1", [](Bytes& b) { b = envisatProduct(2, "ASA_IMS_1PNPDE20040101_101010_000000162023_00123_09876_0001.N1"); }, 979201,
+         "ASA_IMS_1PNPDE20040101_101010_000000162023_00123_09876_0001.N1, not raw data"},
         {"ISP length", [](Bytes& b) { putU16(b, 3203 + 24, 11400); }, 979203, "states a length of 11433"},
         {"truncated", [](Bytes& b) { b.resize(3203 + 11498 * 2 + 100); }, 0, ""},
         {"offset beyond 64 bits", [](Bytes& b) { replaceText(b, "+00000000000000003203", "+20000000000000003203"); }, 979210,
