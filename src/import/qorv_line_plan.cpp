@@ -584,8 +584,8 @@ void fPlanWindow(CDraft& theDraft, const CCodes& theCodes, const CRules& theRule
     p.mFirstSwst = p.mLines.front().mSwst;
     p.mFirstRange = p.mLines.front().mRange;
     if (!aChanges.empty())
-        p.mNotes.push_back(std::string(aRange ? "the slant range of the first sample moves " : "the sampling window start moves ") +
-                           aChanges.list());
+        p.mNotes.push_back(std::string(aRange ? "the slant range of the first sample" : "the sampling window start") +
+                           " moves " + aChanges.list());
     if (!aGarbage.empty())
         p.mNotes.push_back(fCount(aGarbage.count(), "record has", "records have") + " " +
                            theRules.garbageWindowWords(p.mPriCode) + " (" + aGarbage.records() + "): written as the " +

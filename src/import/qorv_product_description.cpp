@@ -125,7 +125,8 @@ void describeRadar(const CNativeArchive& a, const CPlannedProduct& p, CProductDe
         d.mNotes.push_back(format("PRF %.7f Hz of the lines; the archive states %.7f Hz", p.mPrf, a.mPrf));
     d.mSamples = p.mSamples > 0 ? p.mSamples : a.mLayout.mSamples;
     if (!(d.mFirstDelay > 0.0))
-        fqorvImportFail(CQORV_ERR_IMPORT_VALUE, format("the window of the first line opens %.6g us after its pulse", d.mFirstDelay * 1e6));
+        fqorvImportFail(CQORV_ERR_IMPORT_VALUE,
+                        format("the window of the first line opens %.6g us after its pulse", d.mFirstDelay * 1e6));
     d.mRangeSpacing = 0.5 * c / d.mSamplingRate;
     d.mNearRange = 0.5 * c * d.mFirstDelay;
     d.mCentreRange = d.mNearRange + 0.5 * d.mSamples * d.mRangeSpacing;

@@ -8,6 +8,7 @@
 #include <cerrno>
 #include <cmath>
 #include <cstring>
+#include <future>
 #include <memory>
 #include <system_error>
 #include <thread>
@@ -76,6 +77,8 @@ public:
     virtual std::size_t chunkLines() const { return std::max<std::size_t>(1, CQORV_WRITE_CHUNK_BYTES / lineBytes()); }
     /// Writes theCount lines from theLines into theOut (theCount lineBytes()).
     virtual void assemble(const CPlannedLine* theLines, std::size_t theCount, uint8_t* theOut) = 0;
+    /// Whether a chunk is assembled while the one before is written.
+    virtual bool overlapsWriting() const { return false; }
 };
 
 /// The lines of ERS and ALOS products: the records read straight into their lines (the samples
@@ -165,13 +168,15 @@ public:
         : mRecords(theRecords), mFields(prefixFields(ENativeFamily::Asar)), mSamplesPos(theArchive.mLayout.mSamplesPos),
           mSamples(static_cast<std::size_t>(theSamples)),
           mLineBytes(static_cast<std::size_t>(CQORV_ASAR_ROW_PREFIX) + 8u * mSamples),
-          mThreads(std::clamp(fqorvThreadCount(), 1, 8)), mTables(bigEndianTables(theArchive.mFbaq))
+          // One thread writes the chunk before (overlapsWriting), the others decode.
+          mThreads(std::clamp(fqorvThreadCount() - 1, 1, 8)), mTables(bigEndianTables(theArchive.mFbaq))
     {
     }
 
     std::size_t lineBytes() const override { return mLineBytes; }
     /// Larger chunks than a copy's: each chunk's decoding is shared by the threads.
     std::size_t chunkLines() const override { return std::max<std::size_t>(1, CQORV_DECODE_CHUNK_BYTES / mLineBytes); }
+    bool overlapsWriting() const override { return true; }
 
     void assemble(const CPlannedLine* theLines, std::size_t theCount, uint8_t* theOut) override
     {
@@ -339,18 +344,32 @@ void writeRaster(const CNativeArchive& a, CNativeRecordFile& theRecords, const C
     }
     const std::size_t aLineBytes = aSource->lineBytes();
     const std::size_t aChunkLines = aSource->chunkLines();
-    std::vector<uint8_t> aOut(aChunkLines * aLineBytes);
+    std::vector<uint8_t> aOut(aChunkLines * aLineBytes), aWritten;
     CPartFile aPart(theRoot.string() + ".part");
+    // A source may assemble a chunk while the one before is written: the write, a copy into the
+    // page cache, takes a core of its own. (Declared after aPart: a failure
+    // waits for the write under way before the part file goes.)
+    std::future<void> aWriting;
+    if (aSource->overlapsWriting()) aWritten.resize(aOut.size());
     const std::size_t n = p.mLines.size();
     int aPercent = -1;
     for (std::size_t aFirst = 0; aFirst < n; aFirst += aChunkLines) {
         const std::size_t aCount = std::min(aChunkLines, n - aFirst);
         aSource->assemble(p.mLines.data() + aFirst, aCount, aOut.data());
-        aPart.write(aOut.data(), aCount * aLineBytes);
+        if (aSource->overlapsWriting()) {
+            if (aWriting.valid()) aWriting.get();
+            std::swap(aOut, aWritten);
+            aWriting = std::async(std::launch::async, [&aPart, &aWritten, theBytes = aCount * aLineBytes] {
+                aPart.write(aWritten.data(), theBytes);
+            });
+        } else {
+            aPart.write(aOut.data(), aCount * aLineBytes);
+        }
         const int aNow = static_cast<int>(100 * (aFirst + aCount) / n);
         if (theProgress && aNow != aPercent) theProgress(aNow);
         aPercent = aNow;
     }
+    if (aWriting.valid()) aWriting.get();
     aPart.commit(theRoot);
 }
 

@@ -414,7 +414,8 @@ TEST(LinePlan, AlosRecordsRepeatsDroppedAndPrfSwitchesChecked)
          "PRF switch at record 300: 2159.827 Hz to 1915.709 Hz"},
         {"a wild slant range", fPulses(1, 601), [](auto& c) { c[200].mRange = -5; c[201].mRange = 2000000; }, -1, 1, 600, 0,
          "2 records have a slant range that is not positive or held for fewer than 8 records (records 200, 201)"},
-        {"a slant range step followed", fPulses(1, 601), [](auto& c) { for (size_t i = 250; i < c.size(); ++i) c[i].mRange += 75; },
+        {"a slant range step followed", fPulses(1, 601),
+         [](auto& c) { for (size_t i = 250; i < c.size(); ++i) c[i].mRange += 75; },
          -1, 1, 600, 0, "the slant range of the first sample moves by +75 m at record 250", 75},
     };
     for (const CCase& c : aCases) {
@@ -447,7 +448,7 @@ TEST(LinePlan, AlosRecordsRepeatsDroppedAndPrfSwitchesChecked)
         const char* mWords;
     };
     for (const CRefusal& r : {CRefusal{300, 304, "the leader states a PRF switch at line 304, the records switch at line 301"},
-                              CRefusal{-1, 200, "the leader states a PRF switch at line 200; the records keep to PRF 2159.827 Hz"},
+                              CRefusal{-1, 200, "a PRF switch at line 200; the records keep to PRF 2159.827 Hz"},
                               CRefusal{599, -1, "at record 599, line 600, the last of the file: one line at the new PRF"},
                               CRefusal{-1, 600, "the leader states a PRF switch at line 600, the last of the file"}}) {
         std::vector<CRecordCodes> aCodes = fAlosRecords(fPulses(1, 601));
