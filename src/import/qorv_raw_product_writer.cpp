@@ -225,7 +225,7 @@ private:
         for (std::size_t i = 0; i < theCount; ++i) {
             const CPlannedLine& l = theLines[i];
             if (l.mSource < 0) continue;
-            if (l.mSamples > mSamples || l.mLength < mSamplesPos)
+            if (l.mLength < mSamplesPos || fqorvFbaqSamples(l.mLength - mSamplesPos) > mSamples)
                 fqorvImportFail(CQORV_ERR_IMPORT_VALUE, "packet of record " + std::to_string(l.mSource) + " (" +
                                                             std::to_string(l.mLength) + " bytes) does not fit its line of " +
                                                             std::to_string(mSamples) + " samples");
