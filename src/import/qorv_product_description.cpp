@@ -10,8 +10,8 @@
 
 namespace {
 
-/// ERS looks to the right of its track.
-constexpr int CQORV_ERS_LOOK_SIGN = +1;
+/// ERS, ENVISAT and ALOS look to the right of their tracks.
+constexpr int CQORV_LOOK_SIGN = +1;
 /// A single state vector is propagated at most this far (s): beyond, drag and the higher terms of
 /// the field make the propagated orbit worse than none.
 constexpr double CQORV_MAX_PROPAGATION = 3600.0;
@@ -45,10 +45,22 @@ double statedOr(double theStated, double theConstant, double theMin, double theM
     return v;
 }
 
+/// A value the archive must state (ASAR, ALOS: no constants stand in); it must lie in
+/// [theMin, theMax].
+double stated(double theStated, double theMin, double theMax, const char* theWhat, const char* theUnit, double theScale)
+{
+    if (!std::isfinite(theStated)) fqorvImportFail(CQORV_ERR_IMPORT_VALUE, std::string("the archive states no ") + theWhat);
+    std::vector<std::string> aNone;
+    return statedOr(theStated, theStated, theMin, theMax, theWhat, theUnit, theScale, aNone);
+}
+
 // ------------------------------------------------------------------------------------------------
 // Stage 1: the radar and the window of the first line
 
-void describeRadar(const CNativeArchive& a, const CPlannedProduct& p, CProductDescription& d)
+/// ERS: the archive's values, the image mode's constants where it states none; the window opens
+/// SWST codes of 4 samples after the echo of the pulse sent RANK pulses before, less the delay
+/// bias of the instrument.
+void describeErsRadar(const CNativeArchive& a, const CPlannedProduct& p, CProductDescription& d)
 {
     const double c = CQORV_LIGHT_SPEED;
     std::vector<std::string> aDefaults;
@@ -63,18 +75,58 @@ void describeRadar(const CNativeArchive& a, const CPlannedProduct& p, CProductDe
         d.mNotes.push_back("the ERS image mode's values where the archive states none: " + aList);
     }
     d.mBandwidth = std::fabs(d.mChirpRate) * d.mPulseLength;
+    d.mFirstDelay = p.mFirstSwst * NQORV_ERS::SWST_SAMPLES_PER_CODE / d.mSamplingRate + NQORV_ERS::RANK / p.mPrf -
+                    NQORV_ERS::DELAY_BIAS;
+}
+
+/// ASAR: everything from the instrument file and the packets. The window opens SWST samples after
+/// the echo of the pulse sent rank pulses before (the rank of the beam set), less the range gate
+/// bias; the chirp rises.
+void describeAsarRadar(const CNativeArchive& a, const CPlannedProduct& p, CProductDescription& d)
+{
+    d.mCarrier = stated(a.mCarrier, 1e9, 1e11, "carrier frequency", "GHz", 1e-9);
+    d.mSamplingRate = stated(a.mSamplingRate, 1e6, 1e9, "sampling rate", "MHz", 1e-6);
+    d.mPulseLength = stated(a.mPulseLength, 1e-7, 1e-3, "pulse length", "us", 1e6);
+    d.mBandwidth = stated(a.mBandwidth, 1e5, 1e9, "chirp bandwidth", "MHz", 1e-6);
+    d.mChirpRate = d.mBandwidth / d.mPulseLength;
+    if (a.mRank < 1) fqorvImportFail(CQORV_ERR_IMPORT_VALUE, "the instrument file gives no rank for the beam set");
+    const double aBias = stated(a.mRangeGateBias, 0.0, 1e-3, "range gate bias", "us", 1e6);
+    d.mFirstDelay = (p.mFirstSwst + static_cast<double>(a.mRank) * p.mPriCode) / d.mSamplingRate - aBias;
+}
+
+/// ALOS: the window's first sample lies at the slant range every record states; the chirp falls.
+void describeAlosRadar(const CNativeArchive& a, const CPlannedProduct& p, CProductDescription& d)
+{
+    const double c = CQORV_LIGHT_SPEED;
+    d.mCarrier = c / stated(a.mWavelength, 0.015, 0.3, "wavelength", "m", 1.0);
+    d.mSamplingRate = stated(a.mSamplingRate, 1e6, 1e9, "sampling rate", "MHz", 1e-6);
+    d.mPulseLength = stated(a.mPulseLength, 1e-7, 1e-3, "pulse length", "us", 1e6);
+    // The calibration record states the chirp's bandwidth; where it does not, the chirp rate serves.
+    d.mBandwidth = std::isfinite(a.mBandwidth) ? a.mBandwidth : std::fabs(a.mChirpRate) * d.mPulseLength;
+    d.mBandwidth = stated(d.mBandwidth, 1e5, 1e9, "chirp bandwidth", "MHz", 1e-6);
+    d.mChirpRate = -d.mBandwidth / d.mPulseLength;
+    if (p.mFirstRange <= 0) fqorvImportFail(CQORV_ERR_IMPORT_VALUE, "no slant range of the first sample");
+    d.mFirstDelay = 2.0 * p.mFirstRange / c;
+}
+
+void describeRadar(const CNativeArchive& a, const CPlannedProduct& p, CProductDescription& d)
+{
+    const double c = CQORV_LIGHT_SPEED;
+    switch (a.mFamily) {
+    case ENativeFamily::Asar: describeAsarRadar(a, p, d); break;
+    case ENativeFamily::Alos: describeAlosRadar(a, p, d); break;
+    default: describeErsRadar(a, p, d); break;
+    }
     if (d.mBandwidth > d.mSamplingRate)
         fqorvImportFail(CQORV_ERR_IMPORT_VALUE, format("chirp bandwidth %.6g MHz above the sampling rate %.6g MHz",
                                                        d.mBandwidth * 1e-6, d.mSamplingRate * 1e-6));
     d.mPrf = p.mPrf;
     if (std::isfinite(a.mPrf) && std::fabs(a.mPrf - p.mPrf) > 0.01)
-        d.mNotes.push_back(format("PRF %.7f Hz from the PRI code %.0f; the archive states %.7f Hz", p.mPrf, p.mPriCode, a.mPrf));
-    d.mSamples = a.mLayout.mSamples;
-
-    // The window opens SWST codes of 4 samples after the echo of the pulse sent RANK pulses before,
-    // less the delay bias of the instrument.
-    d.mFirstDelay = p.mFirstSwst * NQORV_ERS::SWST_SAMPLES_PER_CODE / d.mSamplingRate + NQORV_ERS::RANK / d.mPrf -
-                    NQORV_ERS::DELAY_BIAS;
+        d.mNotes.push_back(format("PRF %.7f Hz of the lines; the archive states %.7f Hz", p.mPrf, a.mPrf));
+    d.mSamples = p.mSamples > 0 ? p.mSamples : a.mLayout.mSamples;
+    if (!(d.mFirstDelay > 0.0))
+        fqorvImportFail(CQORV_ERR_IMPORT_VALUE,
+                        format("the window of the first line opens %.6g us after its pulse", d.mFirstDelay * 1e6));
     d.mRangeSpacing = 0.5 * c / d.mSamplingRate;
     d.mNearRange = 0.5 * c * d.mFirstDelay;
     d.mCentreRange = d.mNearRange + 0.5 * d.mSamples * d.mRangeSpacing;
@@ -177,7 +229,7 @@ void describeCentre(const CNativeArchive& a, const CStateVectorOrbit& theOrbit, 
 {
     const double aMiddle = 0.5 * (d.mStartTime + d.mStopTime);
     CZeroDopplerPoint p;
-    if (!fqorvZeroDopplerPoint(theOrbit, aMiddle, d.mSceneRange, 0.0, CQORV_ERS_LOOK_SIGN, p))
+    if (!fqorvZeroDopplerPoint(theOrbit, aMiddle, d.mSceneRange, 0.0, CQORV_LOOK_SIGN, p))
         fqorvImportFail(CQORV_ERR_IMPORT_VALUE, format("the window (slant range %.3f km at mid swath) reaches no ground from the orbit",
                                                        d.mSceneRange * 1e-3));
     d.mCentreLatitude = p.mLatitudeDeg;
@@ -185,7 +237,7 @@ void describeCentre(const CNativeArchive& a, const CStateVectorOrbit& theOrbit, 
     d.mIncidenceDeg = p.mIncidenceDeg;
     d.mLookDeg = p.mLookDeg;
     d.mHeadingDeg = p.mHeadingDeg;
-    d.mProcessingVelocity = fqorvEffectiveVelocity(theOrbit, aMiddle, d.mSceneRange, 0.0, CQORV_ERS_LOOK_SIGN);
+    d.mProcessingVelocity = fqorvEffectiveVelocity(theOrbit, aMiddle, d.mSceneRange, 0.0, CQORV_LOOK_SIGN);
     const COrbitState s = theOrbit.at(aMiddle);
     const double aSpeed = std::sqrt(s.mVelocity[0] * s.mVelocity[0] + s.mVelocity[1] * s.mVelocity[1] + s.mVelocity[2] * s.mVelocity[2]);
     // The effective velocity is about the geometric mean of the satellite's and the beam's ground speed.

@@ -1,5 +1,7 @@
 // What the header of an imported raw product states beyond its lines: the radar values (the
-// archive's, or the format's constants where it states none), the window of the first line, the
+// archive's; for ERS the image mode's constants where it states none), the window of the first
+// line (ERS: SWST code, rank 9 and delay bias; ASAR: SWST in samples, the beam set's rank and the
+// instrument's range gate bias; ALOS: the slant range its records state), the
 // times, the orbit, and the scene centre with its incidence and effective velocity, worked out from
 // the orbit at the product's own middle line and middle range (so that a product cut out of a long
 // segment describes itself, not the segment).
@@ -16,7 +18,7 @@ struct CProductDescription {
     // Radar
     double mCarrier = 0.0;            // Hz
     double mSamplingRate = 0.0;       // Hz
-    double mChirpRate = 0.0;          // Hz/s, signed
+    double mChirpRate = 0.0;          // Hz/s, signed: ERS and ASAR chirps rise, ALOS chirps fall
     double mPulseLength = 0.0;        // s
     double mBandwidth = 0.0;          // Hz, |K| T
     double mPrf = 0.0;                // Hz, of the product's PRI code
@@ -47,7 +49,7 @@ struct CProductDescription {
 /// theOrbitName, replaces the archive's state vectors when it is given. CImportFailure 979207 when
 /// the orbit does not cover the product (the vectors' span, extended by one spacing at each end,
 /// must hold every pulse; a single vector may be at most an hour from the product), 979210 when the
-/// window reaches no ground or a radar value is impossible.
+/// window reaches no ground or a radar value is impossible (or, for ASAR and ALOS, not stated).
 CProductDescription fqorvDescribeProduct(const CNativeArchive& theArchive, const CPlannedProduct& theProduct,
                                          const std::vector<CStateVector>& theOutsideOrbit,
                                          const std::string& theOrbitName);

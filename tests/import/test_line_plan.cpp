@@ -265,4 +265,199 @@ TEST(LinePlan, CutRenumbersFromTheFirstLineTheChainKeeps)
     fFailure(CQORV_ERR_IMPORT_OPTION, [&] { fqorvCutPlan(aPlan, 312, 8); });   // repeats only
 }
 
+// ------------------------------------------------------------------------------------------------
+// ASAR and ALOS
+
+constexpr double kAsarFs = 19.20768e6;
+constexpr int kAsarPri = 11028;
+constexpr int kAsarSwst = 1232;
+constexpr uint32_t kAlosPrf = 2159827;   // mHz
+
+/// One ASAR packet per pulse index, echoes unless listed in theNoise: the mode packet count from
+/// 5000, the sensing time in us (truncated), packets of 68 + 6762 bytes back to back (6656
+/// samples; every tenth one block shorter).
+std::vector<CRecordCodes> fAsarPackets(int theCount, const std::vector<int>& theNoise = {})
+{
+    std::vector<CRecordCodes> aCodes;
+    uint64_t aOffset = 3203;
+    for (int k = 0; k < theCount; ++k) {
+        CRecordCodes c;
+        c.mMarker = true;
+        c.mCounter = 5000u + static_cast<uint32_t>(k);
+        c.mClock = static_cast<int64_t>(std::floor((kT0 + k * kAsarPri / kAsarFs) * 1e6));
+        c.mSwst = kAsarSwst;
+        c.mPri = kAsarPri;
+        c.mEcho = std::find(theNoise.begin(), theNoise.end(), k) == theNoise.end();
+        c.mOffset = aOffset;
+        c.mLength = 68 + (k % 10 == 9 ? 6762 - 64 : 6762);
+        aOffset += c.mLength;
+        aCodes.push_back(c);
+    }
+    return aCodes;
+}
+
+CNativeArchive fFamilyArchive(ENativeFamily theFamily, int64_t theSwitchLine = -1)
+{
+    CNativeArchive a = fArchive();
+    a.mFamily = a.mLayout.mFamily = theFamily;
+    a.mClock.mWraps32 = false;
+    a.mClock.mLatchPulses = 0;
+    a.mClock.mTickSeconds = theFamily == ENativeFamily::Asar ? 1e-6 : 1e-3;
+    a.mSamplingRate = kAsarFs;
+    a.mLayout.mSamplesPos = theFamily == ENativeFamily::Asar ? 68 : 412;
+    a.mLayout.mSamples = 5000;
+    a.mPrfSwitchLine = theSwitchLine;
+    return a;
+}
+
+/// One ALOS record per line number in theLines: PRF 2159.827 Hz, slant range 850 km, the time of
+/// day in whole ms.
+std::vector<CRecordCodes> fAlosRecords(const std::vector<int64_t>& theLines)
+{
+    std::vector<CRecordCodes> aCodes;
+    for (int64_t n : theLines) {
+        CRecordCodes c;
+        c.mMarker = true;
+        c.mCounter = static_cast<uint32_t>(n);
+        c.mClock = static_cast<int64_t>(std::floor((kT0 + (n - 1) / (kAlosPrf * 1e-3)) * 1e3));
+        c.mPrfMilliHz = kAlosPrf;
+        c.mRange = 850000;
+        aCodes.push_back(c);
+    }
+    return aCodes;
+}
+
+TEST(LinePlan, AsarPacketsStayOnThePulseGrid)
+{
+    struct CCase {
+        const char* mName;
+        std::vector<int> mNoise;
+        CEdit mEdit;
+        size_t mProducts;
+        int64_t mLines, mFills;      // of the first product
+        int mLastSwst;               // of the last line of the last product
+        const char* mNote;
+    };
+    std::vector<int> aBurst = {3, 100};
+    for (int k = 200; k < 240; ++k) aBurst.push_back(k);
+    auto aFrom = [](int theFirst, auto theEdit) -> CEdit {
+        return [=](std::vector<CRecordCodes>& c) {
+            for (size_t i = theFirst; i < c.size(); ++i) theEdit(c[i]);
+        };
+    };
+    const CCase aCases[] = {
+        {"noise packets left out and their pulses kept", aBurst, {}, 1, 598, 40, kAsarSwst,
+         "42 packets are no echo (noise or calibration) and left out (records 3, 100, 200, 201 and 38 more)"},
+        {"a PRI change splits", {}, aFrom(300, [](CRecordCodes& c) { c.mPri = kAsarPri + 12; }), 2, 300, 0, kAsarSwst,
+         "11028 (1741.719 Hz) to 11040 (1739.826 Hz) at record 300"},
+        {"any SWST step left to the chain", {}, aFrom(300, [](CRecordCodes& c) { c.mSwst = kAsarSwst + 37; }), 1, 600, 0,
+         kAsarSwst + 37, "moves by +37 samples at record 300"},
+        {"a SWST beyond the pulse interval is garbage", {}, aFrom(300, [](CRecordCodes& c) { c.mSwst = kAsarPri; }), 1, 600,
+         0, kAsarSwst, "300 records have a window code outside 1 .. 11027 samples"},
+    };
+    for (const CCase& c : aCases) {
+        SCOPED_TRACE(c.mName);
+        std::vector<CRecordCodes> aCodes = fAsarPackets(600, c.mNoise);
+        if (c.mEdit) c.mEdit(aCodes);
+        const CLinePlan aPlan = fqorvPlanLines(aCodes, fFamilyArchive(ENativeFamily::Asar));
+        ASSERT_EQ(aPlan.mProducts.size(), c.mProducts);
+        const CPlannedProduct& p = aPlan.mProducts.front();
+        EXPECT_EQ(static_cast<int64_t>(p.mLines.size()), c.mLines);
+        EXPECT_EQ(fFillLines(p), c.mFills);
+        EXPECT_EQ(aPlan.mProducts.back().mLines.back().mSwst, c.mLastSwst);
+        EXPECT_TRUE(fNoted(aPlan, c.mNote));
+        for (const std::string& n : p.mNotes) EXPECT_EQ(n.find("lost"), std::string::npos) << n;   // they lose no line
+        EXPECT_NEAR(p.mPrf, kAsarFs / kAsarPri, 1e-9);
+        EXPECT_EQ(p.mSamples, 6656);
+        EXPECT_NEAR(p.mFirstPulseTime, kT0, 2e-6);
+        for (const CPlannedLine& l : p.mLines) {
+            if (l.mSource < 0) continue;
+            // Each echo's line stands at its own pulse and knows where its packet lies.
+            EXPECT_EQ(l.mCounter, aCodes[l.mSource].mCounter - aCodes[p.mFirstRecord].mCounter + 1);
+            EXPECT_TRUE(aCodes[l.mSource].mEcho);
+            EXPECT_EQ(l.mOffset, aCodes[l.mSource].mOffset);
+            EXPECT_EQ(l.mSamples, l.mLength == 68 + 6762 ? 6656u : 6656u - 63u);
+            EXPECT_EQ(l.mPri, p.mPriCode);
+        }
+    }
+}
+
+TEST(LinePlan, AlosRecordsRepeatsDroppedAndPrfSwitchesChecked)
+{
+    // Line numbers 1..300, a repeat of 291..300, 301..600.
+    const std::vector<int64_t> aRepeat = fPulses(301, 601, fPulses(291, 301, fPulses(1, 301)));
+    auto aSwitchAt = [](size_t theRecord) -> CEdit {
+        // The records from theRecord on at 1915.709 Hz, their times too.
+        return [=](std::vector<CRecordCodes>& c) {
+            const double aSwitch = kT0 + theRecord / (kAlosPrf * 1e-3);
+            for (size_t i = theRecord; i < c.size(); ++i) {
+                c[i].mPrfMilliHz = 1915709;
+                c[i].mClock = static_cast<int64_t>(std::floor((aSwitch + (i - theRecord) / 1915.709) * 1e3));
+            }
+        };
+    };
+    struct CCase {
+        const char* mName;
+        std::vector<int64_t> mLines;
+        CEdit mEdit;
+        int64_t mLeaderSwitch;
+        size_t mProducts;
+        int64_t mLines0, mFills0;
+        const char* mNote;
+        int32_t mRangeStep = 0;   // from record 250 on
+    };
+    const CCase aCases[] = {
+        {"a repeat dropped", aRepeat, {}, -1, 1, 600, 0, "10 records repeat or go back to earlier line numbers (records 300,"},
+        {"a long gap filled", fPulses(341, 641, fPulses(1, 301)), {}, -1, 1, 640, 40, "40 lines filled for 1 gap"},
+        {"a gap of 30 left to the chain", fPulses(331, 631, fPulses(1, 301)), {}, -1, 1, 600, 0, "30 lines lost in 1 gap"},
+        {"a PRF switch the leader states splits", fPulses(1, 601), aSwitchAt(300), 302, 2, 300, 0,
+         "PRF switch at record 300: 2159.827 Hz to 1915.709 Hz"},
+        {"a wild slant range", fPulses(1, 601), [](auto& c) { c[200].mRange = -5; c[201].mRange = 2000000; }, -1, 1, 600, 0,
+         "2 records have a slant range that is not positive or held for fewer than 8 records (records 200, 201)"},
+        {"a slant range step followed", fPulses(1, 601),
+         [](auto& c) { for (size_t i = 250; i < c.size(); ++i) c[i].mRange += 75; },
+         -1, 1, 600, 0, "the slant range of the first sample moves by +75 m at record 250", 75},
+    };
+    for (const CCase& c : aCases) {
+        SCOPED_TRACE(c.mName);
+        std::vector<CRecordCodes> aCodes = fAlosRecords(c.mLines);
+        if (c.mEdit) c.mEdit(aCodes);
+        const CLinePlan aPlan = fqorvPlanLines(aCodes, fFamilyArchive(ENativeFamily::Alos, c.mLeaderSwitch));
+        ASSERT_EQ(aPlan.mProducts.size(), c.mProducts);
+        const CPlannedProduct& p = aPlan.mProducts.front();
+        EXPECT_EQ(static_cast<int64_t>(p.mLines.size()), c.mLines0);
+        EXPECT_EQ(fFillLines(p), c.mFills0);
+        EXPECT_TRUE(fNoted(aPlan, c.mNote));
+        EXPECT_EQ(p.mPriCode, static_cast<int>(kAlosPrf));
+        EXPECT_NEAR(p.mFirstPulseTime, kT0, 50e-6);
+        EXPECT_EQ(p.mFirstRange, 850000);
+        // The counters the chain reads never repeat or go back; the range of a line is its
+        // record's unless that one is wild; byte 60 holds the ERS code of the PRF.
+        uint32_t aLast = 0;
+        for (const CPlannedLine& l : p.mLines) {
+            EXPECT_GT(l.mCounter, aLast);
+            aLast = l.mCounter;
+            EXPECT_EQ(l.mPri, 2193);
+            if (l.mSource >= 0) EXPECT_EQ(l.mRange, 850000 + (l.mSource >= 250 ? c.mRangeStep : 0)) << "record " << l.mSource;
+        }
+    }
+    // The leader's switch must match the records' within two lines, and no switch can stand on the
+    // last line.
+    struct CRefusal {
+        int64_t mSwitchRecord, mLeaderLine;
+        const char* mWords;
+    };
+    for (const CRefusal& r : {CRefusal{300, 304, "the leader states a PRF switch at line 304, the records switch at line 301"},
+                              CRefusal{-1, 200, "a PRF switch at line 200; the records keep to PRF 2159.827 Hz"},
+                              CRefusal{599, -1, "at record 599, line 600, the last of the file: one line at the new PRF"},
+                              CRefusal{-1, 600, "the leader states a PRF switch at line 600, the last of the file"}}) {
+        std::vector<CRecordCodes> aCodes = fAlosRecords(fPulses(1, 601));
+        if (r.mSwitchRecord >= 0) aSwitchAt(r.mSwitchRecord)(aCodes);
+        const std::string aWords = fFailure(CQORV_ERR_IMPORT_PRF_SWITCH, [&] {
+            fqorvPlanLines(aCodes, fFamilyArchive(ENativeFamily::Alos, r.mLeaderLine));
+        });
+        EXPECT_NE(aWords.find(r.mWords), std::string::npos) << aWords;
+    }
+}
+
 }  // namespace
