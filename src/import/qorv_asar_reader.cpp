@@ -280,8 +280,8 @@ void readOrbit(const CNativeOutsideFiles& theOutside, const std::vector<std::str
     if (!theMph.has("STATE_VECTOR_TIME") || !theMph.has("VECTOR_SOURCE")) return;
     const CStateVector aOwn = fqorvEnvisatStateVector(theMph, a.mReferenceDay);
     a.mNotes.push_back("the main product header's one state vector (" + theMph.text("VECTOR_SOURCE") + ", " +
-                       timeText(a.mReferenceDay, aOwn.mTime) + ") is not used: " + std::to_string(a.mStateVectors.size()) +
-                       " state vectors of the " + a.mStateVectorSource + " are");
+                       timeText(a.mReferenceDay, aOwn.mTime) + ") is not used; the " + a.mStateVectorSource + " gives " +
+                       std::to_string(a.mStateVectors.size()) + " around the scene");
 }
 
 // ------------------------------------------------------------------------------------------------

@@ -142,6 +142,37 @@ TEST(ImportRun, BrokenInputsFailWithTheirIdsAndLeaveNoProduct)
     }
     EXPECT_TRUE(!fs::exists(aOut) || fs::is_empty(aOut));
 
+    // ASAR without its outside files or with one of the wrong kind, an ALOS image file without its
+    // leader.
+    ASSERT_EQ(aBox.simulate((aBox.data() / "asar").string(), {"--preset", "envisat", "--format", "n1", "--lines", "256",
+                                                                "--samples", "1024", "--targets", "grid:1x1", "--no-noise"})
+                  .mStatus,
+              0);
+    ASSERT_EQ(aBox.simulate((aBox.data() / "palsar").string(), {"--preset", "alos", "--format", "alos", "--lines", "256",
+                                                                  "--samples", "1280", "--targets", "grid:1x1", "--no-noise"})
+                  .mStatus,
+              0);
+    fs::create_directories(aBox.data() / "alone");
+    for (const auto& f : fs::directory_iterator(aBox.data() / "palsar"))
+        if (f.path().filename().string().rfind("IMG-", 0) == 0) fs::copy(f.path(), aBox.data() / "alone" / f.path().filename());
+    const std::string aN1 = (aBox.data() / "asar.N1").string();
+    const std::vector<Case> aOthers = {Case{{"--aux", (aBox.data() / "notes.txt").string(), aN1}, 15, "failure 979213"},
+                                       Case{{"--aux", (aBox.data() / "asar_DOR_VOR_AX").string(), aN1}, 15, "failure 979213"},
+                                       Case{{(aBox.data() / "alone").string()}, 15, "failure 979202"}};
+    for (const Case& c : aOthers) {
+        std::vector<std::string> a = {"--out", aOut.string()};
+        a.insert(a.end(), c.mArgs.begin(), c.mArgs.end());
+        const qtest::RunResult r = run(aBox, kImport, a);
+        EXPECT_EQ(r.mStatus, c.mStatus) << c.mWords << r.mStderr;
+        EXPECT_NE(r.mStderr.find(c.mWords), std::string::npos) << r.mStderr;
+    }
+    fs::remove(aBox.data() / "asar_ASA_INS_AX");
+    const qtest::RunResult aNoAux = run(aBox, kImport, {"--out", aOut.string(), aN1});
+    EXPECT_EQ(aNoAux.mStatus, 15) << aNoAux.mStderr;
+    EXPECT_NE(aNoAux.mStderr.find("failure 979212"), std::string::npos) << aNoAux.mStderr;
+    EXPECT_NE(aNoAux.mStderr.find("--aux"), std::string::npos) << aNoAux.mStderr;
+    EXPECT_TRUE(!fs::exists(aOut) || fs::is_empty(aOut));
+
     // A data file cut in its 700th line: the 699 whole lines are imported, with the warning.
     fs::resize_file(aArchive / "DAT_01.001", fs::file_size(aArchive / "DAT_01.001") - 324 * 11644 - 100);
     const qtest::RunResult r = run(aBox, kImport, {"--out", aOut.string(), aArchive.string()});
@@ -217,6 +248,7 @@ TEST(ImportRun, ArchivesOfEveryFormatFocusAtTheTruth)
                                               {"--slc", aSlc.string(), "--truth", (aBox.data() / "clutter_truth.json").string(),
                                                "--only-isolated", "--json", aIrfJson.string()});
             ASSERT_EQ(aIrf.mStatus, 0) << aIrf.mStdout << aIrf.mStderr;
+            std::printf("%s", aIrf.mStdout.c_str());
             const CJson aTargets = CJson::parseFile(aIrfJson.string())["targets"];
             ASSERT_EQ(aTargets.size(), 4u) << aIrf.mStdout;
             for (const CJson& t : aTargets.elements()) {
