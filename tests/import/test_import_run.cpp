@@ -143,13 +143,14 @@ TEST(ImportRun, BrokenInputsFailWithTheirIdsAndLeaveNoProduct)
     EXPECT_TRUE(!fs::exists(aOut) || fs::is_empty(aOut));
 
     // ASAR without its outside files or with one of the wrong kind, an ALOS image file without its
-    // leader.
+    // leader, an ALOS PRF switch on the last line.
     ASSERT_EQ(aBox.simulate((aBox.data() / "asar").string(), {"--preset", "envisat", "--format", "n1", "--lines", "256",
                                                                 "--samples", "1024", "--targets", "grid:1x1", "--no-noise"})
                   .mStatus,
               0);
     ASSERT_EQ(aBox.simulate((aBox.data() / "palsar").string(), {"--preset", "alos", "--format", "alos", "--lines", "256",
-                                                                  "--samples", "1280", "--targets", "grid:1x1", "--no-noise"})
+                                                                  "--samples", "1280", "--targets", "grid:1x1", "--no-noise",
+                                                                  "--prf-change", "255:2210"})
                   .mStatus,
               0);
     fs::create_directories(aBox.data() / "alone");
@@ -158,7 +159,8 @@ TEST(ImportRun, BrokenInputsFailWithTheirIdsAndLeaveNoProduct)
     const std::string aN1 = (aBox.data() / "asar.N1").string();
     const std::vector<Case> aOthers = {Case{{"--aux", (aBox.data() / "notes.txt").string(), aN1}, 15, "failure 979213"},
                                        Case{{"--aux", (aBox.data() / "asar_DOR_VOR_AX").string(), aN1}, 15, "failure 979213"},
-                                       Case{{(aBox.data() / "alone").string()}, 15, "failure 979202"}};
+                                       Case{{(aBox.data() / "alone").string()}, 15, "failure 979202"},
+                                       Case{{(aBox.data() / "palsar").string()}, 15, "failure 979214"}};
     for (const Case& c : aOthers) {
         std::vector<std::string> a = {"--out", aOut.string()};
         a.insert(a.end(), c.mArgs.begin(), c.mArgs.end());
