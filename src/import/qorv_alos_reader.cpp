@@ -10,7 +10,6 @@
 // line, truncated to the millisecond. The day of the first record is the reference day; the clock
 // counts milliseconds from its midnight, so a scene across midnight keeps increasing times.
 #include <fcntl.h>
-#include <sys/uio.h>
 
 #include <algorithm>
 #include <cerrno>
@@ -22,15 +21,14 @@
 
 #include "qorv_ceos_records.h"
 #include "qorv_date.h"
+#include "qorv_generic_utility.h"
 #include "qorv_import_failure.h"
 #include "qorv_native_formats.h"
 #include "qorv_native_reader.h"
 
 namespace {
 
-constexpr double CQORV_ALOS_LIGHT = 299792458.0;           // m/s
 constexpr uint32_t CQORV_ALOS_PREFIX = 412;                 // bytes before the samples of a signal record
-constexpr int CQORV_ALOS_CODE_SPAN = 120;                   // prefix bytes the codes need (range s32 at 116)
 constexpr double CQORV_ALOS_FBS_RATE = 32.0e6;              // Hz, single polarisation
 constexpr double CQORV_ALOS_FBD_RATE = 16.0e6;              // Hz, dual polarisation
 constexpr double CQORV_ALOS_FBS_BANDWIDTH = 28.0e6;         // Hz, nominal chirps where no calibration record states one
@@ -46,11 +44,10 @@ constexpr int TX_POL = 52, RX_POL = 54, PRF = 56, RANGE = 116;
 
 int32_t bigEndianS32(const uint8_t* theBytes) { return static_cast<int32_t>(fqorvBigEndianU32(theBytes)); }
 
-/// Days since 1970 of a year and a day of that year (1 = 1 January); theCache keeps the last year.
-long dayOf(uint32_t theYear, uint32_t theDayOfYear, std::pair<uint32_t, long>& theCache)
+/// Days since 1970 of a year and a day of that year (1 = 1 January).
+long dayOf(uint32_t theYear, uint32_t theDayOfYear)
 {
-    if (theCache.first != theYear) theCache = {theYear, fqorvDaysFromCivil(static_cast<int>(theYear), 1, 1)};
-    return theCache.second + static_cast<long>(theDayOfYear) - 1;
+    return fqorvDaysFromCivil(static_cast<int>(theYear), 1, 1) + static_cast<long>(theDayOfYear) - 1;
 }
 
 /// The polarisation of a file name "IMG-HV-...", "" when the name does not say.
@@ -132,8 +129,7 @@ void readImageFile(const std::filesystem::path& theImage, CNativeArchive& theArc
     if (aYear < 1990 || aYear > 2100 || aDayOfYear < 1 || aDayOfYear > 366)
         fqorvImportFail(CQORV_ERR_IMPORT_VALUE, aName + ": the first record's date (year " + std::to_string(aYear) + ", day " +
                                                     std::to_string(aDayOfYear) + ") is not one");
-    std::pair<uint32_t, long> aCache{0, 0};
-    theArchive.mReferenceDay = dayOf(aYear, aDayOfYear, aCache);
+    theArchive.mReferenceDay = dayOf(aYear, aDayOfYear);
     theArchive.mClock.mReferenceTime = 0.0;
     theArchive.mClock.mReferenceTicks = 0;
     theArchive.mClock.mTickSeconds = NQORV_ALOS::CLOCK_TICK;
@@ -181,7 +177,7 @@ void readDataSetSummary(const CCeosFields& theDss, CNativeArchive& theArchive)
     theArchive.mOrbit = static_cast<int>(theDss.integer(444, 8).value_or(-1));
 
     theArchive.mWavelength = fqorvCeosRequiredReal(theDss, 500, 16, "wavelength");
-    theArchive.mCarrier = CQORV_ALOS_LIGHT / theArchive.mWavelength;
+    theArchive.mCarrier = CQORV_LIGHT_SPEED / theArchive.mWavelength;
     theArchive.mSamplingRate = theDss.real(710, 16) * 1.0e6;   // MHz
     theArchive.mPulseLength = theDss.real(742, 16) * 1.0e-6;   // us
     theArchive.mIBias = theDss.real(818, 16);
@@ -286,71 +282,20 @@ CNativeArchive fqorvReadAlosCeos(const std::filesystem::path& theLeader, const s
     return aArchive;
 }
 
-std::vector<CRecordCodes> fqorvScanAlosRecords(int theFd, const CNativeRecordLayout& theLayout,
-                                               const std::function<void(int)>& theProgress)
+long fqorvAlosRecordDay(const uint8_t* thePrefix)
 {
-    // The records come in chunks of one call each: the prefix of a record lands in a slot of its
-    // own, the rest of it in one scratch line that stays in the cache, so the samples cost a copy
-    // within the cache and the calls number one per few hundred records.
-    const uint64_t n = theLayout.mRecords;
-    const uint32_t aLength = theLayout.mRecordLength;
-    const std::size_t aPerCall = std::clamp<std::size_t>((std::size_t{4} << 20) / aLength, 1, 500);
-    std::vector<uint8_t> aPrefixes(aPerCall * CQORV_ALOS_CODE_SPAN);
-    std::vector<uint8_t> aScratch(aLength - CQORV_ALOS_CODE_SPAN);
-    std::vector<iovec> aPieces(2 * aPerCall);
-    std::vector<CRecordCodes> aCodes(n);
-    std::pair<uint32_t, long> aCache{0, 0};
-    long aReferenceDay = 0;
-    int aPercent = -1;
-    for (uint64_t aFirst = 0; aFirst < n; aFirst += aPerCall) {
-        const std::size_t m = static_cast<std::size_t>(std::min<uint64_t>(aPerCall, n - aFirst));
-        for (std::size_t k = 0; k < m; ++k) {
-            aPieces[2 * k] = {aPrefixes.data() + k * CQORV_ALOS_CODE_SPAN, CQORV_ALOS_CODE_SPAN};
-            aPieces[2 * k + 1] = {aScratch.data(), aScratch.size()};
-        }
-        uint64_t aOffset = theLayout.mFirstRecord + aFirst * aLength;
-        std::size_t aLeft = m * aLength, i = 0;
-        while (aLeft > 0) {
-            const ssize_t r = ::preadv(theFd, aPieces.data() + i, static_cast<int>(2 * m - i), static_cast<off_t>(aOffset));
-            if (r < 0 && errno == EINTR) continue;
-            if (r <= 0)
-                fqorvImportFail(CQORV_ERR_RASTER_READ, theLayout.mDataFile.string() + ": records " + std::to_string(aFirst + 1) +
-                                                           " to " + std::to_string(aFirst + m) + " can't be read" +
-                                                           (r < 0 ? std::string(": ") + std::strerror(errno) : std::string()));
-            aOffset += static_cast<uint64_t>(r);
-            aLeft -= static_cast<std::size_t>(r);
-            for (std::size_t aDone = static_cast<std::size_t>(r); aDone > 0 && i < 2 * m;) {
-                const std::size_t t = std::min(aDone, aPieces[i].iov_len);
-                aPieces[i].iov_base = static_cast<uint8_t*>(aPieces[i].iov_base) + t;
-                aPieces[i].iov_len -= t;
-                aDone -= t;
-                if (aPieces[i].iov_len == 0) ++i;
-            }
-        }
-        for (std::size_t k = 0; k < m; ++k) {
-            const uint8_t* p = aPrefixes.data() + k * CQORV_ALOS_CODE_SPAN;
-            const uint64_t aIndex = aFirst + k;
-            const uint32_t aStated = fqorvBigEndianU32(p + NPos::LENGTH);
-            if (aStated != aLength)
-                fqorvImportFail(CQORV_ERR_IMPORT_RECORD_LENGTH,
-                                theLayout.mDataFile.filename().string() + ": record " + std::to_string(aIndex + 1) + " at byte " +
-                                    std::to_string(theLayout.mFirstRecord + aIndex * aLength) + " states a length of " +
-                                    std::to_string(aStated) + " bytes, the first record " + std::to_string(aLength));
-            const long aDay = dayOf(fqorvBigEndianU32(p + NPos::YEAR), fqorvBigEndianU32(p + NPos::DAY_OF_YEAR), aCache);
-            if (aIndex == 0) aReferenceDay = aDay;
-            CRecordCodes& c = aCodes[aIndex];
-            c.mCounter = fqorvBigEndianU32(p + NPos::LINE);
-            c.mClock = static_cast<int64_t>(aDay - aReferenceDay) * CQORV_ALOS_MS_PER_DAY + fqorvBigEndianU32(p + NPos::MS_OF_DAY);
-            c.mPrfMilliHz = fqorvBigEndianU32(p + NPos::PRF);
-            c.mRange = bigEndianS32(p + NPos::RANGE);
-            c.mSamples = fqorvBigEndianU32(p + NPos::PIXELS);
-            c.mSwst = 0;
-            c.mPri = 0;
-            c.mMarker = true;
-            c.mEcho = true;
-        }
-        const int aNow = static_cast<int>((aFirst + m) * 100 / n);
-        if (theProgress && aNow != aPercent) theProgress(aPercent = aNow);
-    }
-    return aCodes;
+    return dayOf(fqorvBigEndianU32(thePrefix + NPos::YEAR), fqorvBigEndianU32(thePrefix + NPos::DAY_OF_YEAR));
+}
+
+CRecordCodes fqorvAlosRecordCodes(const uint8_t* thePrefix, long theReferenceDay)
+{
+    CRecordCodes c;
+    c.mCounter = fqorvBigEndianU32(thePrefix + NPos::LINE);
+    c.mClock = static_cast<int64_t>(fqorvAlosRecordDay(thePrefix) - theReferenceDay) * CQORV_ALOS_MS_PER_DAY +
+               fqorvBigEndianU32(thePrefix + NPos::MS_OF_DAY);
+    c.mPrfMilliHz = fqorvBigEndianU32(thePrefix + NPos::PRF);
+    c.mRange = bigEndianS32(thePrefix + NPos::RANGE);
+    c.mSamples = fqorvBigEndianU32(thePrefix + NPos::PIXELS);
+    c.mMarker = true;   // no marker byte: every record's codes are taken as they stand
+    return c;
 }

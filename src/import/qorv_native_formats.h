@@ -77,6 +77,13 @@ CNativeArchive fqorvReadAlosCeos(const std::filesystem::path& theLeader, const s
 std::vector<CRecordCodes> fqorvScanAsarPackets(int theFd, const CNativeRecordLayout& theLayout,
                                                const std::function<void(int)>& theProgress);
 
-/// The codes of every record of an ALOS image file (qorv_alos_reader.cpp).
-std::vector<CRecordCodes> fqorvScanAlosRecords(int theFd, const CNativeRecordLayout& theLayout,
-                                               const std::function<void(int)>& theProgress);
+/// Bytes at the start of an ALOS signal record that hold its codes (the slant range, s32 at 116).
+inline constexpr int CQORV_ALOS_CODE_SPAN = 120;
+
+/// The day (days since 1970) of an ALOS signal record from its first CQORV_ALOS_CODE_SPAN bytes.
+long fqorvAlosRecordDay(const uint8_t* thePrefix);
+
+/// The codes of an ALOS signal record from its first CQORV_ALOS_CODE_SPAN bytes, its time in ms
+/// from the midnight of theReferenceDay (qorv_alos_reader.cpp). The record walk is the one of every
+/// record file of one length (CNativeRecordFile::scan).
+CRecordCodes fqorvAlosRecordCodes(const uint8_t* thePrefix, long theReferenceDay);

@@ -102,17 +102,20 @@ uint32_t statedLength(const CNativeRecordLayout& theLayout, const uint8_t* theRe
     return aValue + static_cast<uint32_t>(theLayout.mLengthAdd);
 }
 
-/// Bytes from a record's start that hold its length field and its auxiliary block.
+/// Bytes from a record's start that hold its length field and its codes (ERS: the auxiliary block).
 uint32_t codeSpan(const CNativeRecordLayout& theLayout)
 {
+    if (theLayout.mFamily == ENativeFamily::Alos) return CQORV_ALOS_CODE_SPAN;
     const int aEnd = std::max({theLayout.mLengthPos + theLayout.mLengthBytes, theLayout.mAuxPos + 26,
                                theLayout.mCounterPos + 4, theLayout.mClockPos + 4, theLayout.mSwstPos + 2,
                                theLayout.mPriPos + 2, theLayout.mMarkerPos + 1});
     return static_cast<uint32_t>(aEnd);
 }
 
-CRecordCodes codesOf(const CNativeRecordLayout& theLayout, const uint8_t* theRecord)
+/// The codes of a record from its first codeSpan() bytes; ALOS times count from theReferenceDay.
+CRecordCodes codesOf(const CNativeRecordLayout& theLayout, const uint8_t* theRecord, long theReferenceDay = 0)
 {
+    if (theLayout.mFamily == ENativeFamily::Alos) return fqorvAlosRecordCodes(theRecord, theReferenceDay);
     CRecordCodes aCodes;
     aCodes.mCounter = fqorvBigEndianU32(theRecord + theLayout.mCounterPos);
     aCodes.mClock = fqorvBigEndianU32(theRecord + theLayout.mClockPos);
@@ -564,14 +567,19 @@ CNativeRecordFile::~CNativeRecordFile()
 std::vector<CRecordCodes> CNativeRecordFile::scan(const std::function<void(int)>& theProgress)
 {
     if (mLayout.mFamily == ENativeFamily::Asar) return fqorvScanAsarPackets(mFd, mLayout, theProgress);
-    if (mLayout.mFamily == ENativeFamily::Alos) return fqorvScanAlosRecords(mFd, mLayout, theProgress);
-    // One read of the few hundred bytes before the samples per record: the page cache serves them
-    // without copying the samples, which make up 96 % of the file. The reads are system calls of
-    // a microsecond each, shared by the threads in contiguous parts; a record that fails is
-    // reported for the earliest record, whatever the thread count.
+    // Records of one length (ERS, ALOS). One read of the bytes that hold the codes per record: the
+    // page cache serves them without copying the samples, which make up 96 % of the file. The
+    // reads are system calls of a microsecond each, shared by the threads in contiguous parts; a
+    // record that fails is reported for the earliest record, whatever the thread count.
     const uint32_t aSpan = codeSpan(mLayout);
     const uint64_t n = mLayout.mRecords;
     std::vector<CRecordCodes> aCodes(n);
+    // ALOS records state their date: times count from the first record's day.
+    long aReferenceDay = 0;
+    if (mLayout.mFamily == ENativeFamily::Alos && n > 0) {
+        std::vector<uint8_t> aFirst(aSpan);
+        if (fqorvReadAt(mFd, mLayout.mFirstRecord, aFirst.data(), aSpan)) aReferenceDay = fqorvAlosRecordDay(aFirst.data());
+    }
     const int aThreads = static_cast<int>(std::clamp<uint64_t>(n / 4096, 1, static_cast<uint64_t>(std::min(fqorvThreadCount(), 4))));
     std::vector<uint64_t> aFailedAt(static_cast<std::size_t>(aThreads), n);
     std::vector<int> aErrno(static_cast<std::size_t>(aThreads), 0);
@@ -586,7 +594,7 @@ std::vector<CRecordCodes> CNativeRecordFile::scan(const std::function<void(int)>
                 aErrno[static_cast<std::size_t>(t)] = errno;
                 return;
             }
-            aCodes[i] = codesOf(mLayout, aPrefix.data());
+            aCodes[i] = codesOf(mLayout, aPrefix.data(), aReferenceDay);
             // The first part's progress stands for all: the parts are of one size.
             const int aNow = static_cast<int>((i + 1 - a) * 100 / (b - a));
             if (t == 0 && theProgress && aNow != aPercent) theProgress(aPercent = aNow);
