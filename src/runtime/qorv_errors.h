@@ -39,6 +39,7 @@ inline constexpr int CQORV_ERR_UNKNOWN_KEY = 848642;            // unknown field
 inline constexpr int CQORV_ERR_FIELD_TYPE = 848644;             // data type or structure differs
 inline constexpr int CQORV_ERR_FIELD_NOT_SET = 848645;          // element not set
 inline constexpr int CQORV_ERR_INDEX_RANGE = 848646;            // index out of range, all pools busy
+inline constexpr int CQORV_ERR_IMPOSSIBLE_VALUE = 848647;       // a raw header's value is impossible for a spaceborne SAR
 inline constexpr int CQORV_ERR_CATCH_ALL = 913920;              // exception in a catch-all handler
 inline constexpr int CQORV_ERR_RASTER_EXCEPTION = 913921;       // exception in raster input or output
 inline constexpr int CQORV_ERR_MAP_ENVIRONMENT = 913922;        // failure in the map code's environment
