@@ -137,6 +137,12 @@ double firstValue(const CDescriptionHeader& theHeader, const char* theKey, doubl
     return valueAt(values(theHeader, theKey), 0, theDefault);
 }
 
+/// Whether a numeric field holds at least one value (not a number counts as one).
+bool holdsValue(const CDescriptionHeader& theHeader, const char* theKey)
+{
+    return !values(theHeader, theKey).mSet.empty();
+}
+
 /// The PRF the chain works with: the extraction copies "PRFExtracted"[0] into "PRF"[0] for every
 /// sensor but ENVISAT-1. 0 when the header gives none.
 double chainPrf(const CDescriptionHeader& theHeader, int theSensor)
@@ -232,9 +238,9 @@ void checkChirp(const CDescriptionHeader& theHeader)
 /// The first delay agrees with the near range, the range spacing with the sampling rate.
 void checkRangeGeometry(const CDescriptionHeader& theHeader)
 {
-    const double aNear = firstValue(theHeader, "Processing.SlantRange", NAN);
-    const double aDelay = firstValue(theHeader, "Processing.FastTime", NAN);
-    if (!std::isnan(aNear) && !std::isnan(aDelay)) {
+    const double aNear = firstValue(theHeader, "Processing.SlantRange", 0.0);
+    const double aDelay = firstValue(theHeader, "Processing.FastTime", 0.0);
+    if (holdsValue(theHeader, "Processing.SlantRange") && holdsValue(theHeader, "Processing.FastTime")) {
         const double aExpected = 2.0 * aNear / CQORV_C;
         if (!(std::abs(aDelay - aExpected) <= CQORV_FAST_TIME_TOLERANCE * aExpected))
             refuse(fqorvStringFormat("Processing.FastTime[0] = %s s: the delay of the first sample lies within "
@@ -242,9 +248,9 @@ void checkRangeGeometry(const CDescriptionHeader& theHeader)
                                      number(aDelay).c_str(), number(100.0 * CQORV_FAST_TIME_TOLERANCE).c_str(),
                                      number(aExpected).c_str()));
     }
-    const double aSpacing = firstValue(theHeader, "Processing.PixelSpacingRg", NAN);
-    const double fs = firstValue(theHeader, "ChannelInfo.SamplingRate", NAN);
-    if (!std::isnan(aSpacing) && !std::isnan(fs)) {
+    const double aSpacing = firstValue(theHeader, "Processing.PixelSpacingRg", 0.0);
+    const double fs = firstValue(theHeader, "ChannelInfo.SamplingRate", 0.0);
+    if (holdsValue(theHeader, "Processing.PixelSpacingRg") && holdsValue(theHeader, "ChannelInfo.SamplingRate")) {
         const double aExpected = CQORV_C / (2.0 * fs);
         if (!(std::abs(aSpacing - aExpected) <= CQORV_SPACING_TOLERANCE * aExpected))
             refuse(fqorvStringFormat("Processing.PixelSpacingRg = %s m: the slant range spacing lies within %s %% of "
@@ -265,20 +271,25 @@ void checkProcessingVelocity(const CDescriptionHeader& theHeader)
                            CQORV_EFFECTIVE_VELOCITY);
 }
 
-/// The scene's first and last line in seconds since 1970; mKnown false without a start time.
-struct CSceneTimes {
+/// The times of the header in seconds since 1970: the scene's first and last line (mKnown false
+/// without a start time) and the first state vector (mHasFirstVector false without one).
+struct CHeaderTimes {
     bool mKnown = false;
     double mStart = 0.0;
     double mStop = 0.0;
+    bool mHasFirstVector = false;
+    double mFirstVector = 0.0;
 };
 
-/// Start and stop parse, and their distance fits the lines and the PRF.
-CSceneTimes checkSceneTimes(const CDescriptionHeader& theHeader, double thePrf)
+/// The dates parse, and the scene's start and stop fit its lines and the PRF.
+CHeaderTimes checkHeaderTimes(const CDescriptionHeader& theHeader, double thePrf)
 {
-    CSceneTimes aTimes;
-    CQorvDate aStart, aStop;
+    CHeaderTimes aTimes;
+    CQorvDate aStart, aStop, aFirstVector;
     const bool aHasStart = parseDate(theHeader, "AcquisitionParameters.AzimuthStartTime", aStart);
     const bool aHasStop = parseDate(theHeader, "AcquisitionParameters.AzimuthStopTime", aStop);
+    aTimes.mHasFirstVector = parseDate(theHeader, "StateVectorData.TimeFirst", aFirstVector);
+    aTimes.mFirstVector = absoluteSeconds(aFirstVector);
     if (!aHasStart) return aTimes;
     const int aLines = static_cast<int>(firstValue(theHeader, "RasterInfo.NrOfLinesPerImage", 0.0));
     aTimes.mKnown = true;
@@ -397,11 +408,10 @@ void checkOrbitalStates(const std::vector<CStateVector>& theVectors, const std::
 
 /// The vectors span the scene, or come within one step of its ends: the orbit fit extrapolates
 /// that far and no further.
-void checkOrbitSpan(const CDescriptionHeader& theHeader, const std::vector<double>& theTimes, const CSceneTimes& theScene)
+void checkOrbitSpan(const CDescriptionHeader& theHeader, const std::vector<double>& theTimes, const CHeaderTimes& theScene)
 {
-    CQorvDate aFirstDate;
-    if (!parseDate(theHeader, "StateVectorData.TimeFirst", aFirstDate) || !theScene.mKnown || theTimes.size() < 2) return;
-    const double aFirst = absoluteSeconds(aFirstDate);
+    if (!theScene.mHasFirstVector || !theScene.mKnown || theTimes.size() < 2) return;
+    const double aFirst = theScene.mFirstVector;
     const double aLast = aFirst + theTimes.back();
     const double aMargin = theTimes.back() / static_cast<double>(theTimes.size() - 1);
     if (aFirst <= theScene.mStart + aMargin && aLast >= theScene.mStop - aMargin) return;
@@ -414,7 +424,7 @@ void checkOrbitSpan(const CDescriptionHeader& theHeader, const std::vector<doubl
 
 /// Enough state vectors for the orbit fit (or none, with the scene centre given), at orbital
 /// radii and speeds, their times increasing and spanning the scene.
-void checkStateVectors(const CDescriptionHeader& theHeader, const CSceneTimes& theScene)
+void checkStateVectors(const CDescriptionHeader& theHeader, const CHeaderTimes& theScene)
 {
     if (!fqorvHasValue(theHeader, "StateVectorData.nStateVectors")) return;
     const int n = theHeader["StateVectorData.nStateVectors"].getInteger();
@@ -426,6 +436,8 @@ void checkStateVectors(const CDescriptionHeader& theHeader, const CSceneTimes& t
                                  n, CQORV_MIN_STATE_VECTORS,
                                  n == 0 ? " (0 only with RegistrationCoordinates.LatNorthing and LonEasting given)"
                                         : ""));
+    // Vectors shorter than their count are the orbit code's to report (848646).
+    if (n > values(theHeader, "StateVectorData.pos_x").mCount) return;
     const std::vector<double> aTimes = stateVectorTimes(theHeader, n);
     const bool aInertial = fqorvHasValue(theHeader, "StateVectorData.StateVectorReference") &&
                            std::strncmp(theHeader["StateVectorData.StateVectorReference"].getString(), "IRS", 3) == 0;
@@ -535,7 +547,7 @@ void fdfCheckRawHeader(const CDescriptionHeader& theHeader)
     checkRangeGeometry(theHeader);
     checkProcessingVelocity(theHeader);
     const double aPrf = chainPrf(theHeader, aSensor);
-    const CSceneTimes aScene = checkSceneTimes(theHeader, aPrf);
+    const CHeaderTimes aScene = checkHeaderTimes(theHeader, aPrf);
     checkStateVectors(theHeader, aScene);
     checkDopplerTable(theHeader, aPrf);
 }

@@ -411,8 +411,8 @@ TEST(RangeCompressionDriver, BadInputEndsWithItsFailureAndNoProduct)
     };
     const fs::path aRaw = aBox.data() / "raw";
     const CCase aCases[] = {
-        {"a replica longer than the range FFT", [&](auto&) { fSetField(aRaw, "ChannelInfo.PulseDuration", 2.0e-4); }, 2,
-         "exceeds #points in the processed range swath"},
+        {"a pulse longer than the echo window", [&](auto&) { fSetField(aRaw, "ChannelInfo.PulseDuration", 2.0e-4); }, 13,
+         "ChannelInfo.PulseDuration = 0.0002 s"},
         {"a channel the raw data do not hold", [&](std::vector<std::string>& theArgs) { fWriteParameters(aBox, "HV"); theArgs[14] = "OK"; }, 2,
          "the requested polarization/channel is not in the raw data"},
         {"a raw file shorter than its header says", [&](auto&) { fs::resize_file(aRaw, fs::file_size(aRaw) / 2); }, 4, ""},
@@ -421,10 +421,10 @@ TEST(RangeCompressionDriver, BadInputEndsWithItsFailureAndNoProduct)
         {"no scene coordinates and a single state vector", [&](auto&) {
              fDropHeaderLines(aRaw, "<LatNorthing>");
              fSetField(aRaw, "StateVectorData.nStateVectors", 1);
-         }, 7, "You need at least 2 state vectors!"},
+         }, 13, "StateVectorData.nStateVectors = 1"},
         {"a processing velocity of 0", [&](auto&) { fSetField(aRaw, "Processing.ProcessingVelocity", 0.0); }, 2, "Velocity"},
-        {"a processing velocity that is not a number", [&](auto&) { fSetField(aRaw, "Processing.ProcessingVelocity", NAN); }, 2,
-         "Velocity"},
+        {"a processing velocity that is not a number", [&](auto&) { fSetField(aRaw, "Processing.ProcessingVelocity", NAN); }, 13,
+         "Processing.ProcessingVelocity = NaN"},
     };
     for (const CCase& c : aCases) {
         SCOPED_TRACE(c.mName);
