@@ -58,6 +58,8 @@ constexpr CValueRange CQORV_INERTIAL_SPEED{6500.0, 8500.0, "m/s", "the inertial 
 constexpr CValueRange CQORV_TIME_DELTA{0.0, 1200.0, "s", "the time between two state vectors",
                                        " and above 0 (the times increase; at most a quarter of the shortest orbit)"};
 
+constexpr double CQORV_MIN_BANDWIDTH = 1e6;         // Hz: a range resolution of 150 m at most
+constexpr double CQORV_MIN_PULSE = 1e-6;            // s: a transmitter in orbit spreads its energy over a long pulse
 constexpr double CQORV_FAST_TIME_TOLERANCE = 1e-3;  // relative, of 2 SlantRange[0] / c
 constexpr double CQORV_SPACING_TOLERANCE = 0.01;    // relative, of c / (2 fs)
 constexpr double CQORV_DURATION_TOLERANCE = 0.10;   // relative, of (lines - 1) / PRF
@@ -209,29 +211,29 @@ void checkFixedRanges(const CDescriptionHeader& theHeader, int theSensor)
         requireInRange(elementName("ChannelInfo.PRFExtracted", i, aExtracted.mCount), v, CQORV_PRF_EXTRACTED);
 }
 
-/// The chirp of each channel: 0 < bandwidth <= sampling rate, 0 < pulse < echo window.
+/// The chirp of each channel: 1 MHz <= bandwidth <= sampling rate, 1 us <= pulse < echo window.
 void checkChirp(const CDescriptionHeader& theHeader)
 {
     const CValues aRates = values(theHeader, "ChannelInfo.SamplingRate");
     const CValues aBandwidths = values(theHeader, "ChannelInfo.BandWidth");
     for (const auto& [i, b] : aBandwidths.mSet) {
         const double fs = valueAt(aRates, i, INFINITY);
-        if (!(b > 0.0 && b <= fs))
-            refuse(fqorvStringFormat("%s = %s Hz: the chirp's bandwidth lies above 0 and at most the sampling rate, %s Hz",
+        if (!(b >= CQORV_MIN_BANDWIDTH && b <= fs))
+            refuse(fqorvStringFormat("%s = %s Hz: the chirp's bandwidth lies in %s Hz .. the sampling rate, %s Hz",
                                      elementName("ChannelInfo.BandWidth", i, aBandwidths.mCount).c_str(),
-                                     number(b).c_str(), number(fs).c_str()));
+                                     number(b).c_str(), number(CQORV_MIN_BANDWIDTH).c_str(), number(fs).c_str()));
     }
     const CValues aPulses = values(theHeader, "ChannelInfo.PulseDuration");
     const double aPixels = firstValue(theHeader, "RasterInfo.NrOfPixelsPerLine", 0.0);
     for (const auto& [i, tau] : aPulses.mSet) {
         const double fs = valueAt(aRates, i, 0.0);
         const double aWindow = aPixels > 0.0 && fs > 0.0 ? aPixels / fs : INFINITY;
-        if (!(tau > 0.0 && tau < aWindow))
-            refuse(fqorvStringFormat("%s = %s s: the pulse lies above 0 and below the echo window, "
+        if (!(tau >= CQORV_MIN_PULSE && tau < aWindow))
+            refuse(fqorvStringFormat("%s = %s s: the pulse lies from %s s up to the echo window, "
                                      "NrOfPixelsPerLine / SamplingRate = %s / %s Hz = %s s",
                                      elementName("ChannelInfo.PulseDuration", i, aPulses.mCount).c_str(),
-                                     number(tau).c_str(), number(aPixels).c_str(), number(fs).c_str(),
-                                     number(aWindow).c_str()));
+                                     number(tau).c_str(), number(CQORV_MIN_PULSE).c_str(), number(aPixels).c_str(),
+                                     number(fs).c_str(), number(aWindow).c_str()));
     }
 }
 
