@@ -36,10 +36,11 @@ struct CFieldRange {
 };
 
 // The ranges of spaceborne SAR: P band to Ka band, low Earth orbits of 200 .. 2000 km altitude.
+constexpr CValueRange CQORV_PRF_RANGE{100.0, 20000.0, "Hz", "the pulse repetition frequency of a spaceborne SAR"};
 constexpr CFieldRange CQORV_FIXED_RANGES[] = {
     {"ChannelInfo.CarrierFrequency", {0.2e9, 40e9, "Hz", "the carrier of a spaceborne SAR"}},
     {"ChannelInfo.SamplingRate", {1e6, 1e9, "Hz", "the range sampling rate of a spaceborne SAR"}},
-    {"ChannelInfo.PRF", {100.0, 20000.0, "Hz", "the pulse repetition frequency of a spaceborne SAR"}},
+    {"ChannelInfo.PRF", CQORV_PRF_RANGE},
     {"ChannelInfo.IncidenceAngle", {5.0, 75.0, "deg", "the incidence angle of a spaceborne SAR"}},
     {"ChannelInfo.RangeLookAngle", {3.0, 70.0, "deg", "the look angle of a spaceborne SAR"}},
     {"Processing.SlantRange", {200e3, 3000e3, "m", "the slant range of a spaceborne SAR"}},
@@ -49,7 +50,6 @@ constexpr CFieldRange CQORV_FIXED_RANGES[] = {
     {"RegistrationCoordinates.LatNorthing", {-90.0, 90.0, "deg", "a latitude"}},
     {"RegistrationCoordinates.LonEasting", {-180.0, 360.0, "deg", "a longitude"}},
 };
-constexpr CValueRange CQORV_PRF_EXTRACTED{100.0, 20000.0, "Hz", "the pulse repetition frequency of a spaceborne SAR"};
 constexpr CValueRange CQORV_EFFECTIVE_VELOCITY{5000.0, 8500.0, "m/s", "the effective velocity of an orbiting platform",
                                                " (or 0: estimated by the chain)"};
 constexpr CValueRange CQORV_ORBIT_RADIUS{6500e3, 8500e3, "m", "the orbital radius of a platform in a low Earth orbit"};
@@ -208,7 +208,7 @@ void checkFixedRanges(const CDescriptionHeader& theHeader, int theSensor)
     if (theSensor == CSAR_SENSOR_ENVISAT1_ID) return;
     const CValues aExtracted = values(theHeader, "ChannelInfo.PRFExtracted");
     for (const auto& [i, v] : aExtracted.mSet)
-        requireInRange(elementName("ChannelInfo.PRFExtracted", i, aExtracted.mCount), v, CQORV_PRF_EXTRACTED);
+        requireInRange(elementName("ChannelInfo.PRFExtracted", i, aExtracted.mCount), v, CQORV_PRF_RANGE);
 }
 
 /// The chirp of each channel: 1 MHz <= bandwidth <= sampling rate, 1 us <= pulse < echo window.
