@@ -1,0 +1,407 @@
+// The header mutation campaign: a valid simulated ERS-2 raw product, one physical field of its
+// header broken at a time (not-a-number, plus and minus infinity, zero, its negative, a thousand
+// times larger and a thousand times smaller), each broken product through the driver (steps 0, 2
+// and 5). A run must end either with a failure id in the result files or with an SLC whose point
+// target keeps to its ideal response. The third outcome (an image made from an impossible value,
+// a crash, a hang) is what the campaign is here to catch. The table of outcomes is printed and
+// written to header_mutations.md in the build directory, from where docs/header-checks.md takes it.
+#include <gtest/gtest-spi.h>
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <cmath>
+#include <cstdio>
+#include <cstdlib>
+#include <filesystem>
+#include <functional>
+#include <map>
+#include <string>
+#include <vector>
+
+#include "qorv_json.h"
+#include "qorvex_irf_check.h"
+#include "qorvex_test_support.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+
+#if defined(__SANITIZE_ADDRESS__)
+// Under the sanitizers two mutations of each field reach every refusal path without taking minutes.
+constexpr bool kSubset = true;
+constexpr int kRunSeconds = 600;
+#else
+constexpr bool kSubset = false;
+constexpr int kRunSeconds = 60;
+#endif
+
+// ------------------------------------------------------------------------------------------------
+// The mutations
+
+enum class EMutation { NotANumber, PlusInfinity, MinusInfinity, Zero, Negative, Thousandfold, Thousandth };
+
+constexpr EMutation kMutations[] = {EMutation::NotANumber, EMutation::PlusInfinity, EMutation::MinusInfinity, EMutation::Zero,
+                                    EMutation::Negative,   EMutation::Thousandfold, EMutation::Thousandth};
+
+const char* fMutationName(EMutation theMutation)
+{
+    switch (theMutation) {
+    case EMutation::NotANumber: return "NaN";
+    case EMutation::PlusInfinity: return "+inf";
+    case EMutation::MinusInfinity: return "-inf";
+    case EMutation::Zero: return "0";
+    case EMutation::Negative: return "negative";
+    case EMutation::Thousandfold: return "x1000";
+    case EMutation::Thousandth: return "/1000";
+    }
+    return "";
+}
+
+std::string fNumberText(double theValue)
+{
+    if (std::isnan(theValue)) return "NaN";
+    if (std::isinf(theValue)) return theValue > 0 ? "inf" : "-inf";
+    char aBuffer[64];
+    std::snprintf(aBuffer, sizeof aBuffer, "%.17g", theValue);
+    return aBuffer;
+}
+
+/// theValue broken by theMutation.
+double fMutated(double theValue, EMutation theMutation)
+{
+    switch (theMutation) {
+    case EMutation::NotANumber: return std::nan("");
+    case EMutation::PlusInfinity: return HUGE_VAL;
+    case EMutation::MinusInfinity: return -HUGE_VAL;
+    case EMutation::Zero: return 0.0;
+    case EMutation::Negative: return -theValue;
+    case EMutation::Thousandfold: return 1000.0 * theValue;
+    case EMutation::Thousandth: return theValue / 1000.0;
+    }
+    return theValue;
+}
+
+/// A number's text broken; an integer keeps integer text where the mutation has one (a thousandth
+/// truncated toward zero) and takes the text "NaN" or "inf" where it has none.
+std::string fMutateNumber(const std::string& theText, EMutation theMutation, bool theInteger)
+{
+    const double aValue = fMutated(std::strtod(theText.c_str(), nullptr), theMutation);
+    if (!theInteger || !std::isfinite(aValue)) return fNumberText(aValue);
+    return std::to_string(static_cast<long long>(aValue));
+}
+
+// Dates "DD-MMM-YYYY hh:mm:ss.uuuuuu" as microseconds since 1970, for the date mutations.
+constexpr const char* kMonths[] = {"JAN", "FEB", "MAR", "APR", "MAY", "JUN", "JUL", "AUG", "SEP", "OCT", "NOV", "DEC"};
+
+long long fParseDate(const std::string& theText)
+{
+    int d = 0, y = 0, hh = 0, mm = 0, ss = 0, us = 0;
+    char aMonth[4] = {};
+    EXPECT_EQ(std::sscanf(theText.c_str(), "%d-%3c-%d %d:%d:%d.%d", &d, aMonth, &y, &hh, &mm, &ss, &us), 7) << theText;
+    unsigned m = 1;
+    while (m <= 12 && std::string(kMonths[m - 1]) != aMonth) ++m;
+    const std::chrono::sys_days aDay{std::chrono::year(y) / std::chrono::month(m) / std::chrono::day(static_cast<unsigned>(d))};
+    return (static_cast<long long>(aDay.time_since_epoch().count()) * 86400 + hh * 3600 + mm * 60 + ss) * 1000000 + us;
+}
+
+std::string fDateText(long long theMicroseconds)
+{
+    const long long aSeconds = theMicroseconds >= 0 ? theMicroseconds / 1000000 : -((-theMicroseconds + 999999) / 1000000);
+    const long long aDays = aSeconds >= 0 ? aSeconds / 86400 : -((-aSeconds + 86399) / 86400);
+    const long long s = aSeconds - aDays * 86400;
+    const std::chrono::year_month_day aDate{std::chrono::sys_days{std::chrono::days{aDays}}};
+    char aBuffer[64];
+    std::snprintf(aBuffer, sizeof aBuffer, "%02u-%s-%04d %02lld:%02lld:%02lld.%06lld", static_cast<unsigned>(aDate.day()),
+                  kMonths[static_cast<unsigned>(aDate.month()) - 1], static_cast<int>(aDate.year()), s / 3600, s / 60 % 60,
+                  s % 60, theMicroseconds - aSeconds * 1000000);
+    return aBuffer;
+}
+
+/// A date broken in its own terms: not a date for NaN, a thousand years later or earlier for the
+/// infinities; the other four act on the scene's duration, moving this end of the scene so that
+/// the duration becomes 0, its negative, a thousand times longer or shorter.
+std::string fMutateDate(const std::string& theStart, const std::string& theStop, bool theStartMoves, EMutation theMutation)
+{
+    const std::string& aOwn = theStartMoves ? theStart : theStop;
+    if (theMutation == EMutation::NotANumber) return "NaN";
+    if (theMutation == EMutation::PlusInfinity || theMutation == EMutation::MinusInfinity) {
+        const int aYear = std::atoi(aOwn.c_str() + 7) + (theMutation == EMutation::PlusInfinity ? 1000 : -1000);
+        char aText[8];
+        std::snprintf(aText, sizeof aText, "%04d", aYear);
+        return aOwn.substr(0, 7) + aText + aOwn.substr(11);
+    }
+    const long long aStart = fParseDate(theStart), aStop = fParseDate(theStop);
+    const long long aMoved = std::llround(fMutated(static_cast<double>(aStop - aStart), theMutation));
+    return fDateText(theStartMoves ? aStop - aMoved : aStart + aMoved);
+}
+
+// ------------------------------------------------------------------------------------------------
+// Editing a header's text
+
+/// The text between <theTag> and </theTag>, as [begin, end) offsets into theHeader.
+std::pair<std::size_t, std::size_t> fFieldSpan(const std::string& theHeader, const std::string& theTag)
+{
+    const std::size_t aOpen = theHeader.find("<" + theTag + ">");
+    const std::size_t aClose = theHeader.find("</" + theTag + ">");
+    EXPECT_NE(aOpen, std::string::npos) << theTag;
+    EXPECT_NE(aClose, std::string::npos) << theTag;
+    if (aOpen == std::string::npos || aClose == std::string::npos) return {0, 0};
+    return {aOpen + theTag.size() + 2, aClose};
+}
+
+std::string fFieldText(const std::string& theHeader, const std::string& theTag)
+{
+    const auto [aBegin, aEnd] = fFieldSpan(theHeader, theTag);
+    return theHeader.substr(aBegin, aEnd - aBegin);
+}
+
+/// theHeader with the values of field theTag replaced by theEdit of each: every value of a vector
+/// or matrix, or only the value theElement. Returns the first value written in theWritten.
+std::string fEditField(const std::string& theHeader, const std::string& theTag, int theElement,
+                       const std::function<std::string(const std::string&)>& theEdit, std::string& theWritten)
+{
+    std::string aHeader = theHeader;
+    auto [aBegin, aEnd] = fFieldSpan(aHeader, theTag);
+    theWritten.clear();
+    if (fFieldText(aHeader, theTag).find("<Value") == std::string::npos) {
+        theWritten = theEdit(fFieldText(aHeader, theTag));
+        return aHeader.replace(aBegin, aEnd - aBegin, theWritten);
+    }
+    int aIndex = 0;
+    for (std::size_t at = aHeader.find("<Value", aBegin); at < aEnd; at = aHeader.find("<Value", at + 1), ++aIndex) {
+        const std::size_t aFrom = aHeader.find('>', at) + 1;
+        const std::size_t aTo = aHeader.find('<', aFrom);
+        if (theElement >= 0 && aIndex != theElement) continue;
+        const std::string aNew = theEdit(aHeader.substr(aFrom, aTo - aFrom));
+        if (theWritten.empty()) theWritten = aNew;
+        aHeader.replace(aFrom, aTo - aFrom, aNew);
+        aEnd = fFieldSpan(aHeader, theTag).second;
+    }
+    return aHeader;
+}
+
+// ------------------------------------------------------------------------------------------------
+// The fields and the rows of the campaign
+
+enum class EKind { Number, Integer, StartDate, StopDate, Name };
+
+struct CField {
+    const char* mName;  // section.field as the table names it
+    EKind mKind = EKind::Number;
+    int mElement = -1;  // -1: every value of a vector or matrix
+};
+
+const std::vector<CField> kFields = {
+    {"ChannelInfo.CarrierFrequency"},
+    {"ChannelInfo.SamplingRate"},
+    {"ChannelInfo.BandWidth"},
+    {"ChannelInfo.PulseDuration"},
+    {"ChannelInfo.PRF"},
+    {"ChannelInfo.PRFExtracted"},
+    {"ChannelInfo.IncidenceAngle"},
+    {"Processing.SlantRange"},
+    {"Processing.FastTime"},
+    {"Processing.PixelSpacingRg"},
+    {"Processing.PixelSpacingAz"},
+    {"Processing.ProcessingVelocity"},
+    {"Processing.DopCenRangeCoeff"},
+    {"InitialGeometry.ReferenceHeight"},
+    {"RegistrationCoordinates.LatNorthing"},
+    {"RegistrationCoordinates.LonEasting"},
+    {"StateVectorData.nStateVectors", EKind::Integer},
+    {"StateVectorData.TimeDelta"},
+    {"StateVectorData.pos_x"},
+    {"StateVectorData.pos_y"},
+    {"StateVectorData.pos_z"},
+    {"StateVectorData.vel_x"},
+    {"StateVectorData.vel_y"},
+    {"StateVectorData.vel_z"},
+    {"StateVectorData.pos_x", EKind::Number, 7},  // the last vector
+    {"StateVectorData.vel_z", EKind::Number, 4},  // the middle one, which the focusing geometry takes
+    {"AcquisitionParameters.AzimuthStartTime", EKind::StartDate},
+    {"AcquisitionParameters.AzimuthStopTime", EKind::StopDate},
+    {"Sensor.SensorName", EKind::Name},
+};
+
+// A near miss of a known name and a name of no known sensor.
+const std::vector<std::string> kSensorNames = {"ERS2", "FOOSAT"};
+
+struct CRow {
+    std::string mField, mMutation, mWritten, mHeader;
+};
+
+std::string fTag(const CField& theField)
+{
+    const std::string aName = theField.mName;
+    return aName.substr(aName.find('.') + 1);
+}
+
+std::vector<CRow> fRows(const std::string& theHeader)
+{
+    const std::string aStart = fFieldText(theHeader, "AzimuthStartTime"), aStop = fFieldText(theHeader, "AzimuthStopTime");
+    std::vector<CRow> aRows;
+    for (const CField& f : kFields) {
+        std::string aLabel = f.mName;
+        if (f.mElement >= 0) aLabel += "[" + std::to_string(f.mElement) + "]";
+        if (f.mKind == EKind::Name) {
+            for (const std::string& aName : kSensorNames) {
+                CRow r{aLabel, aName == "ERS2" ? "near miss" : "unknown", aName, {}};
+                r.mHeader = fEditField(theHeader, fTag(f), -1, [&](const std::string&) { return aName; }, r.mWritten);
+                aRows.push_back(r);
+            }
+            continue;
+        }
+        for (EMutation m : kMutations) {
+            if (kSubset && m != EMutation::NotANumber && m != EMutation::Negative) continue;
+            CRow r{aLabel, fMutationName(m), {}, {}};
+            std::function<std::string(const std::string&)> aEdit = [&](const std::string& v) {
+                return fMutateNumber(v, m, f.mKind == EKind::Integer);
+            };
+            if (f.mKind == EKind::StartDate || f.mKind == EKind::StopDate)
+                aEdit = [&](const std::string&) { return fMutateDate(aStart, aStop, f.mKind == EKind::StartDate, m); };
+            r.mHeader = fEditField(theHeader, fTag(f), f.mElement, aEdit, r.mWritten);
+            aRows.push_back(r);
+        }
+    }
+    return aRows;
+}
+
+// ------------------------------------------------------------------------------------------------
+// One run and its outcome
+
+struct COutcome {
+    std::string mText;
+    bool mThird = false;
+};
+
+/// The parameter lines of a failure's result file, after its "[EC : id]" line, joined by blanks.
+std::string fFailureWords(const std::string& theErrorFile)
+{
+    std::string aWords;
+    bool aAfterId = false;
+    for (const std::string& aLine : qtest::readLines(theErrorFile)) {
+        if (aAfterId && aLine.find_first_not_of(' ') == std::string::npos) break;
+        if (aAfterId) aWords += (aWords.empty() ? "" : " ") + aLine;
+        if (aLine.find("[EC : ") != std::string::npos) aAfterId = true;
+    }
+    return aWords;
+}
+
+/// What the point-target report says of a target out of bounds: its offset and the measures
+/// against the ideal (widths as ratios, sidelobe ratios as differences in dB).
+std::string fOutOfBounds(const fs::path& theReport)
+{
+    if (!fs::exists(theReport)) return "no point-target report";
+    const CJson aReport = CJson::parseFile(theReport.string());
+    if (aReport["targets"].size() != 1 || !aReport["targets"][std::size_t{0}]["found"].boolean()) return "the target is not found";
+    const CJson& t = aReport["targets"][std::size_t{0}];
+    const CJson& aIdeal = aReport["ideal"];
+    char aText[256];
+    std::snprintf(aText, sizeof aText, "%.2f lines, %.2f pixels off; widths x%.2f rg, x%.2f az; PSLR %+.1f rg, %+.1f az dB",
+                  t["line_error"].number(), t["pixel_error"].number(),
+                  t["range"]["irw"].number() / aIdeal["range"]["irw"].number(),
+                  t["azimuth"]["irw"].number() / aIdeal["azimuth"]["irw"].number(),
+                  t["range"]["pslr_db"].number() - aIdeal["range"]["pslr_db"].number(),
+                  t["azimuth"]["pslr_db"].number() - aIdeal["azimuth"]["pslr_db"].number());
+    return aText;
+}
+
+class CCampaign {
+public:
+    CCampaign()
+    {
+        const qtest::RunResult r = mBox.simulate(mBox.data() / "scene_raw", {"--preset", "ers2", "--lines", "1536", "--samples", "1024",
+                                                                              "--targets", "grid:1x1", "--no-noise", "--write-doppler"});
+        EXPECT_EQ(r.mStatus, 0) << r.mStderr;
+        mHeader = qtest::readFile(mBox.data() / "scene_raw.sml");
+    }
+    const std::string& header() const { return mHeader; }
+
+    /// Runs the driver on the raw raster with theHeader in a directory of its own, removed after.
+    COutcome run(const std::string& theHeader, int theIndex)
+    {
+        const fs::path aDir = mBox.data() / ("run" + std::to_string(theIndex));
+        fs::create_directories(aDir);
+        fs::create_symlink(mBox.data() / "scene_raw", aDir / "scene_raw");
+        qtest::writeFile(aDir / "scene_raw.sml", theHeader);
+        auto aArgs = qtest::DriverSandbox::defaultArguments(aDir / "scene_raw", aDir / "scene_slc");
+        aArgs[10] = "OK";              // Doppler ambiguity
+        aArgs[15] = aArgs[17] = "OK";  // no Doppler estimation and no autofocus: a lone target and no clutter
+        const fs::path aWorking = aDir / "Process.working";
+        const qtest::RunResult r = mBox.run(mBox.writeArguments(aArgs, "run.txt"),
+                                            {{"QORVEX_WORKING_FILE", aWorking.string()}}, kRunSeconds);
+        COutcome aOutcome = classify(r, aDir, aWorking);
+        if (!std::getenv("QORVEX_KEEP_TEST_DIRS")) fs::remove_all(aDir);
+        return aOutcome;
+    }
+
+private:
+    COutcome classify(const qtest::RunResult& theRun, const fs::path& theDir, const fs::path& theWorking) const
+    {
+        if (theRun.mStatus >= 128)
+            return {theRun.mStatus == 128 + 9 ? "no end within " + std::to_string(kRunSeconds) + " s"
+                                              : "killed by signal " + std::to_string(theRun.mStatus - 128),
+                    true};
+        const bool aFocused = theRun.mExitId == 0 || theRun.mExitId == 65280;
+        if (theRun.mExitId < 0 || (theRun.mStatus == 0) != aFocused)
+            return {"exit status " + std::to_string(theRun.mStatus) + " with exit id " + std::to_string(theRun.mExitId), true};
+        if (!aFocused) {
+            const std::string aError = theWorking.string() + "_error";
+            const std::string aId = std::to_string(theRun.mExitId);
+            if (!fs::exists(aError) || qtest::readFile(aError).find("[EC : " + aId + "]") == std::string::npos)
+                return {aId + ", not in the result files", true};
+            return {aId + " " + fFailureWords(aError), false};
+        }
+        const fs::path aSlc = theDir / "scene_slc";
+        if (!fs::exists(aSlc)) return {"exit 0 without an SLC", true};
+        ::testing::TestPartResultArray aFailures;
+        {
+            ::testing::ScopedFakeTestPartResultReporter aReporter(
+                ::testing::ScopedFakeTestPartResultReporter::INTERCEPT_ONLY_CURRENT_THREAD, &aFailures);
+            qtest::expectIdealTargets(mBox, aSlc, mBox.data() / "scene_raw_truth.json", 1);
+        }
+        if (aFailures.size() == 0) return {"focused within bounds", false};
+        return {"exit 0, out of bounds: " + fOutOfBounds(aSlc.string() + "_irf.json"), true};
+    }
+
+    qtest::DriverSandbox mBox;
+    std::string mHeader;
+};
+
+std::string fEscapeCell(std::string theText)
+{
+    for (std::size_t at = theText.find('|'); at != std::string::npos; at = theText.find('|', at + 2)) theText.replace(at, 1, "\\|");
+    return theText;
+}
+
+// ------------------------------------------------------------------------------------------------
+
+TEST(HeaderMutations, EveryBrokenFieldIsRefusedOrFocusesWithinBounds)
+{
+    CCampaign aCampaign;
+    const auto aBegin = std::chrono::steady_clock::now();
+    const COutcome aIntact = aCampaign.run(aCampaign.header(), 0);
+    ASSERT_EQ(aIntact.mText, "focused within bounds") << "the intact product";
+
+    // A mutation that leaves the header as it was (a thousand times 0) is not run again.
+    std::map<std::string, COutcome> aOutcomes = {{aCampaign.header(), aIntact}};
+    const std::vector<CRow> aRows = fRows(aCampaign.header());
+    std::string aTable = "| Field | Mutation | Value written | Outcome |\n|---|---|---|---|\n";
+    int aThird = 0;
+    for (std::size_t k = 0; k < aRows.size(); ++k) {
+        const CRow& r = aRows[k];
+        if (aOutcomes.count(r.mHeader) == 0) aOutcomes[r.mHeader] = aCampaign.run(r.mHeader, static_cast<int>(k) + 1);
+        const COutcome& o = aOutcomes[r.mHeader];
+        EXPECT_FALSE(o.mThird) << r.mField << " " << r.mMutation << " (" << r.mWritten << "): " << o.mText;
+        aThird += o.mThird ? 1 : 0;
+        aTable += "| " + r.mField + " | " + r.mMutation + " | " + r.mWritten + " | " + (o.mThird ? "**" : "") +
+                  fEscapeCell(o.mText) + (o.mThird ? "**" : "") + " |\n";
+    }
+    const double aSeconds = std::chrono::duration<double>(std::chrono::steady_clock::now() - aBegin).count();
+    const fs::path aOut = qtest::binaryDir().parent_path() / "header_mutations.md";
+    qtest::writeFile(aOut, aTable);
+    std::printf("%s\n%zu mutations in %zu runs, %d third outcomes, %.1f s; the table is in %s\n", aTable.c_str(), aRows.size(),
+                aOutcomes.size(), aThird, aSeconds, aOut.c_str());
+}
+
+}  // namespace
