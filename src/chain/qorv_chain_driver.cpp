@@ -11,6 +11,7 @@
 #include "qorv_header_chain.h"
 #include "qorv_prf_extraction.h"
 #include "qorv_progress.h"
+#include "qorv_raw_header_checks.h"
 
 // ------------------------------------------------------------------------------------------------
 // Step list
@@ -303,6 +304,8 @@ int runChain(const std::string& theCommandLine, const CStepRow* theTable, long l
     std::unique_ptr<CChainRun> aRun = prepareRun(theCommandLine);
     // A run asked to end quietly when its input is missing ends before anything reads the input.
     if (aRun->endIfInputMissing() && !fqorvFileExists(aRun->currentInput())) QORV_SUCCESS();
+    // The first product's raw header rules the run: later products of a list take it at step 2.
+    if (fdfStepsReadRawEchoes(aRun->stepList())) fdfCheckRawHeaderOf(aRun->currentInput());
     fdfExtractPrfChanges(aRun->currentInput().c_str());
 
     fdfTrace("\naNbrOfVal = %d  CQORV_FOC_INPUT_PARAM_NBR = %d", aRun->argCount(), CQORV_FOC_INPUT_PARAM_NBR);

@@ -10,6 +10,7 @@
 #include <cstring>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 #include "qorv_chirp.h"
@@ -181,9 +182,14 @@ void fSetUp(int argc, char** argv, CRangeCompressionRun& r, std::unique_ptr<CDes
     r.mChirp.mChirp = r.mChirpText.c_str();
     r.mChirp.mSpectrum = r.mSpectrumText.c_str();
     r.mChirp.mBaseband = fqorvHasValue(in, "Sensor.Baseband") && std::strcmp(in["Sensor.Baseband"].getString(), "YES") == 0;
-    if (!(r.mChirp.mSamplingRate > 0.0) || !(r.mChirp.mPulseDuration >= 0.0) || !(r.mPrf > 0.0)) {
+    // Each refusal names the field at fault.
+    const std::pair<const char*, bool> aChirpValues[] = {{"ChannelInfo.SamplingRate", r.mChirp.mSamplingRate > 0.0},
+                                                         {"ChannelInfo.PulseDuration", r.mChirp.mPulseDuration >= 0.0},
+                                                         {"ChannelInfo.PRF", r.mPrf > 0.0}};
+    for (const auto& [aKey, aPossible] : aChirpValues) {
+        if (aPossible) continue;
         fdfTrace("Error: sampling rate %g, pulse duration %g, PRF %g\n", r.mChirp.mSamplingRate, r.mChirp.mPulseDuration, r.mPrf);
-        QORV_FATAL(CQORV_ERR_WRONG_REQUEST, "ChannelInfo.SamplingRate");
+        QORV_FATAL(CQORV_ERR_WRONG_REQUEST, aKey);
     }
     r.mSwstNullValue = fqorvHasValue(in, "Processing.SWST_null_value_used") ? in["Processing.SWST_null_value_used"].getInteger() : 0;
     r.mPixelSpacing = CSAR_C / (r.mChirp.mSamplingRate * 2.0);

@@ -2,6 +2,7 @@
 #include "qorv_identifiers.h"
 
 #include <cstring>
+#include <iterator>
 
 #include "qorv_enviroment.h"
 
@@ -246,6 +247,14 @@ int fqorvSensorStrToID(const char* aName)
         if (aHit) return aRow.mId;
     }
     return CSAR_SENSOR_UNKNOWN_ID;
+}
+
+bool fqorvSensorRow(int theRow, const char*& theText, int& theId)
+{
+    if (theRow < 0 || theRow >= static_cast<int>(std::size(CSENSOR_TABLE))) return false;
+    theText = CSENSOR_TABLE[theRow].mText;
+    theId = CSENSOR_TABLE[theRow].mId;
+    return true;
 }
 
 int fqorvOrigProdStrToID(const char* aConstStr)

@@ -75,6 +75,9 @@ inline constexpr int CQORV_ORIG_PROD_TABLE_ROWS = 183;
 /// prefixes (tested first, in that order); -1 for null, empty or unknown texts.
 int fqorvSensorStrToID(const char* aName);
 
+/// Row i of the sensor table (text and id), for listings and suggestions; false outside the table.
+bool fqorvSensorRow(int theRow, const char*& theText, int& theId);
+
 /// Product id of an "ORIGIN DATA" text: the whole table is walked and the last exact match wins;
 /// -1 for null or unknown texts. The trace shows the result.
 int fqorvOrigProdStrToID(const char* aConstStr);

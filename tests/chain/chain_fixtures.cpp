@@ -39,7 +39,8 @@ void writeSmallRawProduct(const std::filesystem::path& theRaw, const SmallRawOpt
     aDescription.setValue(0, "VV");
     setVector(aHeader, "ChannelInfo.CarrierFrequency", {5.3e9});
     setVector(aHeader, "ChannelInfo.SamplingRate", {18.96e6});
-    setVector(aHeader, "ChannelInfo.PulseDuration", {37.12e-6});
+    // A pulse that fits the short echo window of 64 samples (3.4 us).
+    setVector(aHeader, "ChannelInfo.PulseDuration", {2.0e-6});
     setVector(aHeader, "ChannelInfo.BandWidth", {15.55e6});
     setVector(aHeader, "ChannelInfo.PRF", {1600.0});
     setVector(aHeader, "ChannelInfo.PRFExtracted", {1679.9});
