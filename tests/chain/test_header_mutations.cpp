@@ -8,6 +8,7 @@
 #include <gtest/gtest-spi.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <chrono>
 #include <cmath>
 #include <cstdio>
@@ -271,17 +272,19 @@ std::vector<CRow> fRows(const std::string& theHeader)
 
 struct COutcome {
     std::string mText;
+    std::string mCell;  // the outcome in a word: the failure id, "focused", or what went wrong
     bool mThird = false;
 };
 
-/// The parameter lines of a failure's result file, after its "[EC : id]" line, joined by blanks.
+/// The parameter of a failure's result file: the lines after its "[EC : id]" line, which cut the
+/// words at a fixed width, joined again.
 std::string fFailureWords(const std::string& theErrorFile)
 {
     std::string aWords;
     bool aAfterId = false;
     for (const std::string& aLine : qtest::readLines(theErrorFile)) {
         if (aAfterId && aLine.find_first_not_of(' ') == std::string::npos) break;
-        if (aAfterId) aWords += (aWords.empty() ? "" : " ") + aLine;
+        if (aAfterId) aWords += aLine;
         if (aLine.find("[EC : ") != std::string::npos) aAfterId = true;
     }
     return aWords;
@@ -338,30 +341,28 @@ public:
 private:
     COutcome classify(const qtest::RunResult& theRun, const fs::path& theDir, const fs::path& theWorking) const
     {
-        if (theRun.mStatus >= 128)
-            return {theRun.mStatus == 128 + 9 ? "no end within " + std::to_string(kRunSeconds) + " s"
-                                              : "killed by signal " + std::to_string(theRun.mStatus - 128),
-                    true};
+        if (theRun.mStatus == 128 + 9) return {"no end within " + std::to_string(kRunSeconds) + " s", "hang", true};
+        if (theRun.mStatus > 128) return {"killed by signal " + std::to_string(theRun.mStatus - 128), "crash", true};
         const bool aFocused = theRun.mExitId == 0 || theRun.mExitId == 65280;
         if (theRun.mExitId < 0 || (theRun.mStatus == 0) != aFocused)
-            return {"exit status " + std::to_string(theRun.mStatus) + " with exit id " + std::to_string(theRun.mExitId), true};
+            return {"exit status " + std::to_string(theRun.mStatus) + " with exit id " + std::to_string(theRun.mExitId), "exit", true};
         if (!aFocused) {
             const std::string aError = theWorking.string() + "_error";
             const std::string aId = std::to_string(theRun.mExitId);
             if (!fs::exists(aError) || qtest::readFile(aError).find("[EC : " + aId + "]") == std::string::npos)
-                return {aId + ", not in the result files", true};
-            return {aId + " " + fFailureWords(aError), false};
+                return {aId + ", not in the result files", "no id", true};
+            return {aId + " " + fFailureWords(aError), aId, false};
         }
         const fs::path aSlc = theDir / "scene_slc";
-        if (!fs::exists(aSlc)) return {"exit 0 without an SLC", true};
+        if (!fs::exists(aSlc)) return {"exit 0 without an SLC", "no SLC", true};
         ::testing::TestPartResultArray aFailures;
         {
             ::testing::ScopedFakeTestPartResultReporter aReporter(
                 ::testing::ScopedFakeTestPartResultReporter::INTERCEPT_ONLY_CURRENT_THREAD, &aFailures);
             qtest::expectIdealTargets(mBox, aSlc, mBox.data() / "scene_raw_truth.json", 1);
         }
-        if (aFailures.size() == 0) return {"focused within bounds", false};
-        return {"exit 0, out of bounds: " + fOutOfBounds(aSlc.string() + "_irf.json"), true};
+        if (aFailures.size() == 0) return {"focused within bounds", "focused", false};
+        return {"exit 0, out of bounds: " + fOutOfBounds(aSlc.string() + "_irf.json"), "bad SLC", true};
     }
 
     qtest::DriverSandbox mBox;
@@ -374,6 +375,43 @@ std::string fEscapeCell(std::string theText)
     return theText;
 }
 
+std::string fMarked(const COutcome& theOutcome, const std::string& theText)
+{
+    return theOutcome.mThird ? "**" + theText + "**" : theText;
+}
+
+/// Two tables in Markdown: the outcome of each field (rows) under each mutation (columns) in a
+/// word, then every run with the value written and the words of its outcome.
+std::string fTables(const std::vector<CRow>& theRows, const std::vector<COutcome>& theOutcomes)
+{
+    std::vector<std::string> aFields, aMutations;
+    for (const CRow& r : theRows) {
+        if (std::find(aFields.begin(), aFields.end(), r.mField) == aFields.end()) aFields.push_back(r.mField);
+        if (std::find(aMutations.begin(), aMutations.end(), r.mMutation) == aMutations.end()) aMutations.push_back(r.mMutation);
+    }
+    std::string aMatrix = "| Field |", aRule = "|---|";
+    for (const std::string& m : aMutations) {
+        aMatrix += " " + m + " |";
+        aRule += "---|";
+    }
+    aMatrix += "\n" + aRule + "\n";
+    for (const std::string& f : aFields) {
+        aMatrix += "| " + f + " |";
+        for (const std::string& m : aMutations) {
+            std::string aCell;
+            for (std::size_t k = 0; k < theRows.size(); ++k)
+                if (theRows[k].mField == f && theRows[k].mMutation == m) aCell = fMarked(theOutcomes[k], theOutcomes[k].mCell);
+            aMatrix += " " + aCell + " |";
+        }
+        aMatrix += "\n";
+    }
+    std::string aRuns = "| Field | Mutation | Value written | Outcome |\n|---|---|---|---|\n";
+    for (std::size_t k = 0; k < theRows.size(); ++k)
+        aRuns += "| " + theRows[k].mField + " | " + theRows[k].mMutation + " | " + theRows[k].mWritten + " | " +
+                 fMarked(theOutcomes[k], fEscapeCell(theOutcomes[k].mText)) + " |\n";
+    return aMatrix + "\n" + aRuns;
+}
+
 // ------------------------------------------------------------------------------------------------
 
 TEST(HeaderMutations, EveryBrokenFieldIsRefusedOrFocusesWithinBounds)
@@ -384,24 +422,23 @@ TEST(HeaderMutations, EveryBrokenFieldIsRefusedOrFocusesWithinBounds)
     ASSERT_EQ(aIntact.mText, "focused within bounds") << "the intact product";
 
     // A mutation that leaves the header as it was (a thousand times 0) is not run again.
-    std::map<std::string, COutcome> aOutcomes = {{aCampaign.header(), aIntact}};
+    std::map<std::string, COutcome> aRuns = {{aCampaign.header(), aIntact}};
     const std::vector<CRow> aRows = fRows(aCampaign.header());
-    std::string aTable = "| Field | Mutation | Value written | Outcome |\n|---|---|---|---|\n";
+    std::vector<COutcome> aOutcomes;
     int aThird = 0;
     for (std::size_t k = 0; k < aRows.size(); ++k) {
         const CRow& r = aRows[k];
-        if (aOutcomes.count(r.mHeader) == 0) aOutcomes[r.mHeader] = aCampaign.run(r.mHeader, static_cast<int>(k) + 1);
-        const COutcome& o = aOutcomes[r.mHeader];
-        EXPECT_FALSE(o.mThird) << r.mField << " " << r.mMutation << " (" << r.mWritten << "): " << o.mText;
-        aThird += o.mThird ? 1 : 0;
-        aTable += "| " + r.mField + " | " + r.mMutation + " | " + r.mWritten + " | " + (o.mThird ? "**" : "") +
-                  fEscapeCell(o.mText) + (o.mThird ? "**" : "") + " |\n";
+        if (aRuns.count(r.mHeader) == 0) aRuns[r.mHeader] = aCampaign.run(r.mHeader, static_cast<int>(k) + 1);
+        aOutcomes.push_back(aRuns[r.mHeader]);
+        EXPECT_FALSE(aOutcomes.back().mThird) << r.mField << " " << r.mMutation << " (" << r.mWritten << "): " << aOutcomes.back().mText;
+        aThird += aOutcomes.back().mThird ? 1 : 0;
     }
     const double aSeconds = std::chrono::duration<double>(std::chrono::steady_clock::now() - aBegin).count();
+    const std::string aTables = fTables(aRows, aOutcomes);
     const fs::path aOut = qtest::binaryDir().parent_path() / "header_mutations.md";
-    qtest::writeFile(aOut, aTable);
-    std::printf("%s\n%zu mutations in %zu runs, %d third outcomes, %.1f s; the table is in %s\n", aTable.c_str(), aRows.size(),
-                aOutcomes.size(), aThird, aSeconds, aOut.c_str());
+    qtest::writeFile(aOut, aTables);
+    std::printf("%s\n%zu mutations in %zu runs, %d third outcomes, %.1f s; the tables are in %s\n", aTables.c_str(), aRows.size(),
+                aRuns.size(), aThird, aSeconds, aOut.c_str());
 }
 
 }  // namespace
