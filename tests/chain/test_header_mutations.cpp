@@ -1,7 +1,7 @@
 // The header mutation campaign: a valid simulated ERS-2 raw product, one physical field of its
 // header broken at a time (not-a-number, plus and minus infinity, zero, its negative, a thousand
-// times larger and a thousand times smaller), each broken product through the driver (steps 0, 2
-// and 5). A run must end either with a failure id in the result files or with an SLC whose point
+// times larger and a thousand times smaller), each broken product through the driver (step 0, range
+// compression, Doppler ambiguity, omega-k focusing). A run must end either with a failure id in the result files or with an SLC whose point
 // target keeps to its ideal response. The third outcome (an image made from an impossible value,
 // a crash, a hang) is what the campaign is here to catch. The table of outcomes is printed and
 // written to header_mutations.md in the build directory, from where docs/header-checks.md takes it.
@@ -19,6 +19,7 @@
 #include <string>
 #include <vector>
 
+#include "qorv_date.h"
 #include "qorv_json.h"
 #include "qorvex_irf_check.h"
 #include "qorvex_test_support.h"
@@ -39,101 +40,52 @@ constexpr int kRunSeconds = 60;
 // ------------------------------------------------------------------------------------------------
 // The mutations
 
-enum class EMutation { NotANumber, PlusInfinity, MinusInfinity, Zero, Negative, Thousandfold, Thousandth };
+struct CMutation {
+    const char* mName;
+    double (*mApply)(double);
+};
 
-constexpr EMutation kMutations[] = {EMutation::NotANumber, EMutation::PlusInfinity, EMutation::MinusInfinity, EMutation::Zero,
-                                    EMutation::Negative,   EMutation::Thousandfold, EMutation::Thousandth};
-
-const char* fMutationName(EMutation theMutation)
-{
-    switch (theMutation) {
-    case EMutation::NotANumber: return "NaN";
-    case EMutation::PlusInfinity: return "+inf";
-    case EMutation::MinusInfinity: return "-inf";
-    case EMutation::Zero: return "0";
-    case EMutation::Negative: return "negative";
-    case EMutation::Thousandfold: return "x1000";
-    case EMutation::Thousandth: return "/1000";
-    }
-    return "";
-}
-
-std::string fNumberText(double theValue)
-{
-    if (std::isnan(theValue)) return "NaN";
-    if (std::isinf(theValue)) return theValue > 0 ? "inf" : "-inf";
-    char aBuffer[64];
-    std::snprintf(aBuffer, sizeof aBuffer, "%.17g", theValue);
-    return aBuffer;
-}
-
-/// theValue broken by theMutation.
-double fMutated(double theValue, EMutation theMutation)
-{
-    switch (theMutation) {
-    case EMutation::NotANumber: return std::nan("");
-    case EMutation::PlusInfinity: return HUGE_VAL;
-    case EMutation::MinusInfinity: return -HUGE_VAL;
-    case EMutation::Zero: return 0.0;
-    case EMutation::Negative: return -theValue;
-    case EMutation::Thousandfold: return 1000.0 * theValue;
-    case EMutation::Thousandth: return theValue / 1000.0;
-    }
-    return theValue;
-}
+const CMutation kMutations[] = {
+    {"NaN", [](double) { return std::nan(""); }},   {"+inf", [](double) { return HUGE_VAL; }},
+    {"-inf", [](double) { return -HUGE_VAL; }},     {"0", [](double) { return 0.0; }},
+    {"negative", [](double v) { return -v; }},      {"x1000", [](double v) { return 1000.0 * v; }},
+    {"/1000", [](double v) { return v / 1000.0; }},
+};
 
 /// A number's text broken; an integer keeps integer text where the mutation has one (a thousandth
 /// truncated toward zero) and takes the text "NaN" or "inf" where it has none.
-std::string fMutateNumber(const std::string& theText, EMutation theMutation, bool theInteger)
+std::string fMutateNumber(const std::string& theText, const CMutation& theMutation, bool theInteger)
 {
-    const double aValue = fMutated(std::strtod(theText.c_str(), nullptr), theMutation);
-    if (!theInteger || !std::isfinite(aValue)) return fNumberText(aValue);
-    return std::to_string(static_cast<long long>(aValue));
-}
-
-// Dates "DD-MMM-YYYY hh:mm:ss.uuuuuu" as microseconds since 1970, for the date mutations.
-constexpr const char* kMonths[] = {"JAN", "FEB", "MAR", "APR", "MAY", "JUN", "JUL", "AUG", "SEP", "OCT", "NOV", "DEC"};
-
-long long fParseDate(const std::string& theText)
-{
-    int d = 0, y = 0, hh = 0, mm = 0, ss = 0, us = 0;
-    char aMonth[4] = {};
-    EXPECT_EQ(std::sscanf(theText.c_str(), "%d-%3c-%d %d:%d:%d.%d", &d, aMonth, &y, &hh, &mm, &ss, &us), 7) << theText;
-    unsigned m = 1;
-    while (m <= 12 && std::string(kMonths[m - 1]) != aMonth) ++m;
-    const std::chrono::sys_days aDay{std::chrono::year(y) / std::chrono::month(m) / std::chrono::day(static_cast<unsigned>(d))};
-    return (static_cast<long long>(aDay.time_since_epoch().count()) * 86400 + hh * 3600 + mm * 60 + ss) * 1000000 + us;
-}
-
-std::string fDateText(long long theMicroseconds)
-{
-    const long long aSeconds = theMicroseconds >= 0 ? theMicroseconds / 1000000 : -((-theMicroseconds + 999999) / 1000000);
-    const long long aDays = aSeconds >= 0 ? aSeconds / 86400 : -((-aSeconds + 86399) / 86400);
-    const long long s = aSeconds - aDays * 86400;
-    const std::chrono::year_month_day aDate{std::chrono::sys_days{std::chrono::days{aDays}}};
-    char aBuffer[64];
-    std::snprintf(aBuffer, sizeof aBuffer, "%02u-%s-%04d %02lld:%02lld:%02lld.%06lld", static_cast<unsigned>(aDate.day()),
-                  kMonths[static_cast<unsigned>(aDate.month()) - 1], static_cast<int>(aDate.year()), s / 3600, s / 60 % 60,
-                  s % 60, theMicroseconds - aSeconds * 1000000);
-    return aBuffer;
+    const double v = theMutation.mApply(std::strtod(theText.c_str(), nullptr));
+    if (std::isnan(v)) return "NaN";
+    if (std::isinf(v)) return v > 0 ? "inf" : "-inf";
+    if (theInteger) return std::to_string(static_cast<long long>(v));
+    char aText[64];
+    std::snprintf(aText, sizeof aText, "%.17g", v);
+    return aText;
 }
 
 /// A date broken in its own terms: not a date for NaN, a thousand years later or earlier for the
 /// infinities; the other four act on the scene's duration, moving this end of the scene so that
 /// the duration becomes 0, its negative, a thousand times longer or shorter.
-std::string fMutateDate(const std::string& theStart, const std::string& theStop, bool theStartMoves, EMutation theMutation)
+std::string fMutateDate(const std::string& theStart, const std::string& theStop, bool theStartMoves, const CMutation& theMutation)
 {
     const std::string& aOwn = theStartMoves ? theStart : theStop;
-    if (theMutation == EMutation::NotANumber) return "NaN";
-    if (theMutation == EMutation::PlusInfinity || theMutation == EMutation::MinusInfinity) {
-        const int aYear = std::atoi(aOwn.c_str() + 7) + (theMutation == EMutation::PlusInfinity ? 1000 : -1000);
-        char aText[8];
-        std::snprintf(aText, sizeof aText, "%04d", aYear);
-        return aOwn.substr(0, 7) + aText + aOwn.substr(11);
+    const double aYears = theMutation.mApply(1.0);
+    if (std::isnan(aYears)) return "NaN";
+    if (std::isinf(aYears)) {
+        char aYear[8];
+        std::snprintf(aYear, sizeof aYear, "%04d", std::atoi(aOwn.c_str() + 7) + (aYears > 0 ? 1000 : -1000));
+        return aOwn.substr(0, 7) + aYear + aOwn.substr(11);
     }
-    const long long aStart = fParseDate(theStart), aStop = fParseDate(theStop);
-    const long long aMoved = std::llround(fMutated(static_cast<double>(aStop - aStart), theMutation));
-    return fDateText(theStartMoves ? aStop - aMoved : aStart + aMoved);
+    CQorvDate aStart, aStop;
+    EXPECT_TRUE(aStart.parse(theStart.c_str()) && aStop.parse(theStop.c_str()));
+    const double aDuration = 86400.0 * static_cast<double>(aStop.dayNumber() - aStart.dayNumber()) + aStop.secondsOfDay() - aStart.secondsOfDay();
+    const double aMoved = theMutation.mApply(aDuration);
+    CQorvDate& aDate = theStartMoves ? aStart : aStop;
+    aDate.set(theStartMoves ? aStop.dayNumber() : aStart.dayNumber(),
+              theStartMoves ? aStop.secondsOfDay() - aMoved : aStart.secondsOfDay() + aMoved);
+    return aDate.text();
 }
 
 // ------------------------------------------------------------------------------------------------
@@ -252,9 +204,9 @@ std::vector<CRow> fRows(const std::string& theHeader)
             }
             continue;
         }
-        for (EMutation m : kMutations) {
-            if (kSubset && m != EMutation::NotANumber && m != EMutation::Negative) continue;
-            CRow r{aLabel, fMutationName(m), {}, {}};
+        for (const CMutation& m : kMutations) {
+            if (kSubset && std::string(m.mName) != "NaN" && std::string(m.mName) != "negative") continue;
+            CRow r{aLabel, m.mName, {}, {}};
             std::function<std::string(const std::string&)> aEdit = [&](const std::string& v) {
                 return fMutateNumber(v, m, f.mKind == EKind::Integer);
             };
