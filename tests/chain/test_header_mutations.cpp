@@ -142,6 +142,7 @@ struct CField {
     const char* mName;  // section.field as the table names it
     EKind mKind = EKind::Number;
     int mElement = -1;  // -1: every value of a vector or matrix
+    bool mOnlyImpossible = false;   // a value the chain estimates: only the mutations that no scene can have
 };
 
 const std::vector<CField> kFields = {
@@ -157,7 +158,11 @@ const std::vector<CField> kFields = {
     {"Processing.PixelSpacingRg"},
     {"Processing.PixelSpacingAz"},
     {"Processing.ProcessingVelocity"},
-    {"Processing.DopCenRangeCoeff"},
+    // The Doppler table is the chain's own estimate (step 1, skipped here): a header may state a
+    // wrong one that some scene has (0, -290 Hz, 0.29 Hz), which focuses where that centroid puts
+    // the target and no check of the header can tell; the campaign breaks it only beyond what any
+    // scene has.
+    {"Processing.DopCenRangeCoeff", EKind::Number, -1, true},
     {"InitialGeometry.ReferenceHeight"},
     {"RegistrationCoordinates.LatNorthing"},
     {"RegistrationCoordinates.LonEasting"},
@@ -206,6 +211,8 @@ std::vector<CRow> fRows(const std::string& theHeader)
         }
         for (const CMutation& m : kMutations) {
             if (kSubset && std::string(m.mName) != "NaN" && std::string(m.mName) != "negative") continue;
+            const std::string aName = m.mName;
+            if (f.mOnlyImpossible && aName != "NaN" && aName != "+inf" && aName != "-inf" && aName != "x1000") continue;
             CRow r{aLabel, m.mName, {}, {}};
             std::function<std::string(const std::string&)> aEdit = [&](const std::string& v) {
                 return fMutateNumber(v, m, f.mKind == EKind::Integer);

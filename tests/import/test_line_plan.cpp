@@ -438,7 +438,9 @@ TEST(LinePlan, AlosRecordsRepeatsDroppedAndPrfSwitchesChecked)
             EXPECT_GT(l.mCounter, aLast);
             aLast = l.mCounter;
             EXPECT_EQ(l.mPri, 2193);
-            if (l.mSource >= 0) EXPECT_EQ(l.mRange, 850000 + (l.mSource >= 250 ? c.mRangeStep : 0)) << "record " << l.mSource;
+            if (l.mSource >= 0) {
+                EXPECT_EQ(l.mRange, 850000 + (l.mSource >= 250 ? c.mRangeStep : 0)) << "record " << l.mSource;
+            }
         }
     }
     // The leader's switch must match the records' within two lines, and no switch can stand on the
