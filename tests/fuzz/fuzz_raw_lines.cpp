@@ -149,11 +149,11 @@ CDescriptionHeader& rawHeader(const CRawParams& p)
 struct CExpected {
     const uint8_t* mFile;
     std::size_t mSize;
-    const CRawParams& p;
+    const CRawParams& mParams;
     int64_t mRecord;
 
-    int fileRow(int theRow) const { return p.mLinesDecrease ? p.mLines - 1 - theRow : theRow; }
-    int64_t recordStart(int theFileRow) const { return int64_t{p.mHeader} + theFileRow * mRecord; }
+    int fileRow(int theRow) const { return mParams.mLinesDecrease ? mParams.mLines - 1 - theRow : theRow; }
+    int64_t recordStart(int theFileRow) const { return int64_t{mParams.mHeader} + theFileRow * mRecord; }
 
     /// A delivered record must lie wholly in the file.
     void checkInFile(int theFileRow, const char* theWhat) const
@@ -166,12 +166,12 @@ struct CExpected {
     fcomplex cell(int theFileRow, int theColumn) const
     {
         static constexpr int aPart[] = {1, 1, 2, 4};
-        const int n = aPart[p.mType];
-        const uint8_t* c = mFile + recordStart(theFileRow) + p.mPrefix + int64_t{theColumn} * 2 * n;
+        const int n = aPart[mParams.mType];
+        const uint8_t* c = mFile + recordStart(theFileRow) + mParams.mPrefix + int64_t{theColumn} * 2 * n;
         const auto part = [&](const uint8_t* x) -> float {
             uint8_t b[4];
-            for (int i = 0; i < n; ++i) b[i] = p.mMsbf ? x[n - 1 - i] : x[i];
-            switch (p.mType) {
+            for (int i = 0; i < n; ++i) b[i] = mParams.mMsbf ? x[n - 1 - i] : x[i];
+            switch (mParams.mType) {
             case 0: return b[0];
             case 1: return static_cast<int8_t>(b[0]);
             case 2: return little<int16_t>(b);
@@ -194,7 +194,7 @@ struct CExpected {
         checkInFile(r, theWhat);
         const auto same = [](float a, float b) { return a == b || (std::isnan(a) && std::isnan(b)); };
         for (int k = 0; k < theCount; ++k) {
-            const int aColumn = p.mPixelsDecrease ? p.mPixels - 1 - (theFirst + k) : theFirst + k;
+            const int aColumn = mParams.mPixelsDecrease ? mParams.mPixels - 1 - (theFirst + k) : theFirst + k;
             const fcomplex e = cell(r, aColumn);
             if (!same(e.real(), theBuffer[k].real()) || !same(e.imag(), theBuffer[k].imag()))
                 fault(std::string(theWhat) + ": row " + std::to_string(theRow) + " index " + std::to_string(k) + " reads (" +
@@ -206,7 +206,7 @@ struct CExpected {
     void checkPrefix(int theFileRow, const uint8_t* thePrefix, const char* theWhat) const
     {
         checkInFile(theFileRow, theWhat);
-        if (std::memcmp(thePrefix, mFile + recordStart(theFileRow), static_cast<std::size_t>(p.mPrefix)) != 0)
+        if (std::memcmp(thePrefix, mFile + recordStart(theFileRow), static_cast<std::size_t>(mParams.mPrefix)) != 0)
             fault(std::string(theWhat) + ": the prefix of line " + std::to_string(theFileRow) + " differs from the file's");
     }
 };
@@ -223,7 +223,7 @@ bool readTyped(CRasterFile& f, const CExpected& e, int theRow, int theStart, int
     bool aRead = false;
     QFUZZ_CLEAN_FAILURES((fqorvReadLine(f, gLine.data(), theRow, theStart, theEnd), aRead = true));
     if (!aRead) return false;
-    const int aEnd = theEnd < 0 ? e.p.mPixels - 1 : theEnd;
+    const int aEnd = theEnd < 0 ? e.mParams.mPixels - 1 : theEnd;
     e.checkLine(theRow, theStart, aEnd - theStart + 1, gLine.data(), theWhat);
     return true;
 }
@@ -233,7 +233,7 @@ bool readTyped(CRasterFile& f, const CExpected& e, int theRow, int theStart, int
 /// again through the line cache.
 void readAll(CRasterFile& f, const CExpected& e)
 {
-    const CRawParams& p = e.p;
+    const CRawParams& p = e.mParams;
     gLine.resize(static_cast<std::size_t>(p.mPixels));
     gPrefix.resize(static_cast<std::size_t>(p.mPrefix));
     const int aLines = p.mLines;
