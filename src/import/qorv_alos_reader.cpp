@@ -291,7 +291,9 @@ CRecordCodes fqorvAlosRecordCodes(const uint8_t* thePrefix, long theReferenceDay
 {
     CRecordCodes c;
     c.mCounter = fqorvBigEndianU32(thePrefix + NPos::LINE);
-    c.mClock = static_cast<int64_t>(fqorvAlosRecordDay(thePrefix) - theReferenceDay) * CQORV_ALOS_MS_PER_DAY +
+    const int64_t aDays = std::clamp<int64_t>(fqorvAlosRecordDay(thePrefix) - theReferenceDay, -CQORV_RECORD_DAYS_LIMIT,
+                                              CQORV_RECORD_DAYS_LIMIT);
+    c.mClock = aDays * CQORV_ALOS_MS_PER_DAY +
                fqorvBigEndianU32(thePrefix + NPos::MS_OF_DAY);
     c.mPrfMilliHz = fqorvBigEndianU32(thePrefix + NPos::PRF);
     c.mRange = bigEndianS32(thePrefix + NPos::RANGE);

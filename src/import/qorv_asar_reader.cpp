@@ -344,8 +344,8 @@ CRecordCodes codesOfPacket(const uint8_t* p, uint64_t theOffset)
 {
     CRecordCodes c;
     const uint32_t aIspLength = fqorvBigEndianU16(p + CQORV_ASAR_LENGTH);
-    const auto aDays = static_cast<int32_t>(fqorvBigEndianU32(p));
-    c.mClock = (static_cast<int64_t>(aDays) * 86400LL + fqorvBigEndianU32(p + 4)) * 1000000LL + fqorvBigEndianU32(p + 8);
+    const int64_t aDays = std::clamp<int64_t>(static_cast<int32_t>(fqorvBigEndianU32(p)), -CQORV_RECORD_DAYS_LIMIT, CQORV_RECORD_DAYS_LIMIT);
+    c.mClock = (aDays * 86400LL + fqorvBigEndianU32(p + 4)) * 1000000LL + fqorvBigEndianU32(p + 8);
     c.mCounter = (static_cast<uint32_t>(p[CQORV_ASAR_COUNTER]) << 16) | (static_cast<uint32_t>(p[CQORV_ASAR_COUNTER + 1]) << 8) |
                  p[CQORV_ASAR_COUNTER + 2];
     c.mPri = fqorvBigEndianU16(p + CQORV_ASAR_PRI);

@@ -77,6 +77,11 @@ CNativeArchive fqorvReadAlosCeos(const std::filesystem::path& theLeader, const s
 std::vector<CRecordCodes> fqorvScanAsarPackets(int theFd, const CNativeRecordLayout& theLayout,
                                                const std::function<void(int)>& theProgress);
 
+/// Days a record's own date may lie from the product's before its clock reading is held at that
+/// distance: a corrupt date (an ASAR packet's day count, an ALOS record's year) then stays a far-off
+/// reading, which the line plan leaves out, instead of overflowing the count of us or ms.
+inline constexpr int64_t CQORV_RECORD_DAYS_LIMIT = 1000000;
+
 /// Bytes at the start of an ALOS signal record that hold its codes (the slant range, s32 at 116).
 inline constexpr int CQORV_ALOS_CODE_SPAN = 120;
 

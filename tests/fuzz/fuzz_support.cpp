@@ -34,6 +34,12 @@ std::string writeInput(const std::string& theName, const uint8_t* theData, std::
     return aPath;
 }
 
+void fault(const std::string& theWhat)
+{
+    std::fprintf(stderr, "fuzz fault: %s\n", theWhat.c_str());
+    std::abort();
+}
+
 void setUpRun()
 {
     static bool aDone = false;
@@ -44,7 +50,7 @@ void setUpRun()
     fs::create_directories(aKeys);
     fs::create_directories(aDir / "work");
     const fs::path aShare = fs::path(QORVEX_SOURCE_DIR) / "share/qorvex";
-    for (const fs::path aFrom : {aShare / "keys", fs::path(QORVEX_SOURCE_DIR) / "tests/store/keys"})
+    for (const fs::path& aFrom : {aShare / "keys", fs::path(QORVEX_SOURCE_DIR) / "tests/store/keys"})
         for (const auto& aEntry : fs::directory_iterator(aFrom))
             fs::copy_file(aEntry.path(), aKeys / aEntry.path().filename(), fs::copy_options::overwrite_existing);
     // The settings and line pools of a run without its catalogues, trace or log.

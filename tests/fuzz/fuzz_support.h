@@ -16,6 +16,8 @@ std::string writeInput(const std::string& theName, const uint8_t* theData, std::
 /// Sets up a run's settings (without catalogues, trace or log) whose key directory holds every
 /// delivered key file plus "StoreTest" and "StoreSecond" (every structure and type); done once.
 void setUpRun();
+/// A fault of the code under test: says what broke on stderr and aborts, so that libFuzzer keeps the input.
+[[noreturn]] void fault(const std::string& theWhat);
 
 }  // namespace qfuzz
 

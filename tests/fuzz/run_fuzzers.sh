@@ -2,7 +2,8 @@
 # Builds the libFuzzer harnesses with clang (AddressSanitizer and UndefinedBehaviorSanitizer) into
 # build-fuzz/ and runs each for a given time on a corpus seeded from the project's own files.
 # Usage: tests/fuzz/run_fuzzers.sh SECONDS [harness ...]   (harnesses: xml_header text_header
-#        key_file arguments json native_archive; all when none is named). Exit status 1 when a
+#        key_file arguments json native_archive raw_lines asar_archive alos_archive; all when none
+#        is named). Exit status 1 when a
 #        harness found a crash.
 # Environment: QORVEX_FUZZ_JOBS (default 1) parallel jobs per harness; QORVEX_FUZZ_NICE (default 19).
 set -euo pipefail
@@ -10,7 +11,7 @@ top=$(cd "$(dirname "$0")/../.." && pwd)
 seconds=${1:?usage: run_fuzzers.sh SECONDS [harness ...]}
 shift
 harnesses=("$@")
-[ ${#harnesses[@]} -gt 0 ] || harnesses=(xml_header text_header key_file arguments json native_archive)
+[ ${#harnesses[@]} -gt 0 ] || harnesses=(xml_header text_header key_file arguments json native_archive raw_lines asar_archive alos_archive)
 build="$top/build-fuzz"
 jobs=${QORVEX_FUZZ_JOBS:-1}
 
@@ -30,7 +31,8 @@ for h in "${harnesses[@]}"; do targets+=("fuzz_$h"); done
 cmake --build "$build" -j "$(nproc)" --target "${targets[@]}"
 
 # Seeds: the project's own headers, key and mandatory files, arguments and JSON examples;
-# native_archive writes its own (simulated archives) into the corpus at start-up.
+# the harnesses of the importers and raw_lines write their own (simulated archives, small rasters)
+# into the corpus at start-up.
 seeds() {
   case "$1" in
     xml_header) ls "$top"/tests/store/golden/*.sml "$top"/tests/fuzz/seeds/xml_header/* ;;
@@ -50,7 +52,7 @@ for h in "${harnesses[@]}"; do
   dict=()
   [ "$h" = xml_header ] && dict=(-dict="$top/tests/fuzz/xml.dict")
   seed_env=()
-  [ "$h" = native_archive ] && seed_env=(QORVEX_FUZZ_SEEDS="$corpus")
+  case "$h" in native_archive | raw_lines | asar_archive | alos_archive) seed_env=(QORVEX_FUZZ_SEEDS="$corpus") ;; esac
   log="$build/fuzz_$h.log"
   before=$(ls "$artifacts" | wc -l)
   echo "fuzz: $h for ${seconds} s (log $log)"

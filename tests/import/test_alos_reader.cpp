@@ -11,6 +11,7 @@
 
 #include "qorv_import_failure.h"
 #include "qorv_json.h"
+#include "qorv_line_plan.h"
 #include "qorv_native_reader.h"
 #include "qorv_sim_alos.h"
 #include "qorv_sim_options.h"
@@ -192,4 +193,23 @@ TEST(AlosReader, FbsValuesAndRefusals)
         EXPECT_EQ(aId, aCase.mId) << aWords;
         EXPECT_NE(aWords.find(aCase.mWords), std::string::npos) << aWords;
     }
+}
+
+TEST(AlosReader, RecordsOfImpossibleDatesAreClockReadingsLeftOut)
+{
+    // A year far out of range once overflowed the record's millisecond count (the sanitizer suite
+    // tells); such a reading is left out like any corrupt one (fewer than one in a hundred).
+    qtest::TempDir aTemp;
+    const fs::path aImage = writeProduct(aTemp / "p", fbsProduct(), 240) / "IMG-HH-ALPSRP123451230-H1.0__A";
+    const auto plan = [&] {
+        const CNativeArchive a = fqorvReadNativeArchive(aImage);
+        return fqorvPlanLines(CNativeRecordFile(a.mLayout).scan(), a);
+    };
+    const CLinePlan aGood = plan();
+    patchU32(aImage, 720 + 5 * 620 + 36, 0x7FFFFFFFu);   // the years of records 5 and 90
+    patchU32(aImage, 720 + 90 * 620 + 36, 0x80000000u);
+    const CLinePlan aPatched = plan();
+    ASSERT_EQ(aPatched.mProducts.size(), 1u);
+    EXPECT_EQ(aPatched.mProducts[0].mLines.size(), aGood.mProducts[0].mLines.size());
+    EXPECT_EQ(aPatched.mProducts[0].mFirstPulseTime, aGood.mProducts[0].mFirstPulseTime);
 }

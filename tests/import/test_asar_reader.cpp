@@ -219,6 +219,28 @@ TEST(AsarReader, ProductAndItsOutsideFilesReadBack)
     }
 }
 
+TEST(AsarReader, PacketsOfImpossibleDaysAreFarOffClockReadings)
+{
+    // A day count far out of range once overflowed the packet's microsecond count (the sanitizer
+    // suite tells). The readings stay on their side of the scene, centuries away, where the line
+    // plan leaves them out.
+    qtest::TempDir aTemp;
+    CAsarFixture f;
+    const std::size_t aPacket2 = 3203 + 2 * (68 + 138);
+    putU32(f.mProduct, aPacket2, 0x7FFFFFFFu);
+    putU32(f.mProduct, aPacket2 + 68 + 138, 0x80000000u);
+    qtest::writeFile(aTemp / "p", f.mProduct);
+    qtest::writeFile(aTemp / "i", f.mInstrument);
+    qtest::writeFile(aTemp / "o", f.mOrbit);
+    const CNativeArchive a = fqorvReadNativeArchive(aTemp / "p");
+    const std::vector<CRecordCodes> aCodes = CNativeRecordFile(a.mLayout).scan();
+    ASSERT_EQ(aCodes.size(), PACKETS.size());
+    const double aCentury = 100 * 365.25 * 86400.0;
+    EXPECT_GT(a.mClock.timeOf(aCodes[2].mClock), aCentury);
+    EXPECT_LT(a.mClock.timeOf(aCodes[3].mClock), -aCentury);
+    EXPECT_NEAR(a.mClock.timeOf(aCodes[4].mClock), 36000.0 + 4 * PRI / FS, 0.5e-6);
+}
+
 TEST(AsarReader, MissingOrWrongOutsideFilesAndBrokenPacketsAreRefused)
 {
     // What each case changes: the files, the outside files given, in the directory d.
