@@ -227,14 +227,24 @@ void fqorvSimWriteRaster(const CSimScene& theScene, const std::string& thePath, 
 
 namespace {
 
+/// What differs between the writers of native archives, opened on the scene's geometry: where
+/// the archive goes, how a record is written, what the archive adds to the truth, and its rename
+/// into place.
+struct CArchiveSink {
+    std::filesystem::path mPath;
+    CRecordSink mWrite;
+    std::function<void(CJson& theTruth, const CSimRunFigures& theFigures)> mAddTruth;
+    std::function<void()> mFinish;
+};
+using COpenArchive = std::function<CArchiveSink(const CSimTimeline&, const CSimOrbit&, const CSimSceneTruth&)>;
+
 /// A native archive: records through the archive's writer, the truth file, then the archive
 /// renamed into place.
-CSimRunReport runNative(const CSimScene& theScene, const std::string& theRoot, const CSimProgress& theProgress)
+CSimRunReport runArchive(const CSimScene& theScene, const std::string& theRoot, const CSimProgress& theProgress,
+                         const COpenArchive& theOpen)
 {
     const auto aStart = std::chrono::steady_clock::now();
     CSimRunReport aReport;
-    const std::filesystem::path aArchive = fqorvSimArchivePath(theScene, theRoot);
-    aReport.mRaster = aArchive.string();
     aReport.mTruth = theRoot + "_truth.json";
     countTargets(theScene, aReport);
     std::remove(aReport.mTruth.c_str());
@@ -243,96 +253,79 @@ CSimRunReport runNative(const CSimScene& theScene, const std::string& theRoot, c
     const CSimTimeline aTimeline(theScene);
     const CSimEchoGenerator aGenerator(theScene, *aOrbit, aTimeline);
     const CSimSceneTruth aTruth = fqorvSimComputeTruth(theScene, *aOrbit, aTimeline);
-    const CSimNativeProduct aProduct = fqorvSimSceneProduct(theScene, aTimeline, *aOrbit, aTruth);
-    const std::unique_ptr<CSimNativeWriter> aWriter = fqorvSimOpenNativeWriter(
-        theScene.mArchive == CSimArchive::Ceos ? CSimNativeFormat::Ceos : CSimNativeFormat::Envisat, aProduct, aArchive);
+    const CArchiveSink aArchive = theOpen(aTimeline, *aOrbit, aTruth);
+    aReport.mRaster = aArchive.mPath.string();
 
     CSimRunFigures aFigures;
-    const CRecordSink aSink = [&](const CSimRecord& r, std::size_t, const uint8_t* theSamples) {
-        aWriter->writeLine(fqorvSimSceneLine(theScene, aTimeline, aProduct.mClock, r), theSamples);
-    };
-    writeRecordsWith(theScene, aTimeline, aGenerator, aSink, aReport, aFigures, theProgress);
+    writeRecordsWith(theScene, aTimeline, aGenerator, aArchive.mWrite, aReport, aFigures, theProgress);
 
-    aFigures.mRasterName = aArchive.filename().string();
+    aFigures.mRasterName = aArchive.mPath.filename().string();
     CJson aTruthJson = fqorvSimTruthJson(theScene, aTruth, aTimeline, *aOrbit, aFigures);
-    fqorvSimAddArchiveTruth(aTruthJson, theScene, aTimeline, aProduct, aArchive);
+    aArchive.mAddTruth(aTruthJson, aFigures);
     aTruthJson.dumpFile(aReport.mTruth);
-    aWriter->finish();
+    aArchive.mFinish();
     aReport.mSeconds = secondsSince(aStart);
     return aReport;
 }
 
-/// An ALOS product: the same road as the ERS archives, through the ALOS writer.
-CSimRunReport runAlos(const CSimScene& theScene, const std::string& theRoot, const CSimProgress& theProgress)
+/// An ERS CEOS or ENVISAT-format archive.
+CArchiveSink openErsArchive(const CSimScene& theScene, const std::string& theRoot, const CSimTimeline& theTimeline,
+                            const CSimOrbit& theOrbit, const CSimSceneTruth& theTruth)
 {
-    const auto aStart = std::chrono::steady_clock::now();
-    CSimRunReport aReport;
-    const std::filesystem::path aArchive = theRoot;
-    aReport.mRaster = aArchive.string();
-    aReport.mTruth = theRoot + "_truth.json";
-    countTargets(theScene, aReport);
-    std::remove(aReport.mTruth.c_str());
+    const std::filesystem::path aPath = fqorvSimArchivePath(theScene, theRoot);
+    const auto aProduct = std::make_shared<const CSimNativeProduct>(fqorvSimSceneProduct(theScene, theTimeline, theOrbit, theTruth));
+    const std::shared_ptr<CSimNativeWriter> aWriter = fqorvSimOpenNativeWriter(
+        theScene.mArchive == CSimArchive::Ceos ? CSimNativeFormat::Ceos : CSimNativeFormat::Envisat, *aProduct, aPath);
+    return {aPath,
+            [&theScene, &theTimeline, aProduct, aWriter](const CSimRecord& r, std::size_t, const uint8_t* theSamples) {
+                aWriter->writeLine(fqorvSimSceneLine(theScene, theTimeline, aProduct->mClock, r), theSamples);
+            },
+            [&theScene, &theTimeline, aProduct, aPath](CJson& theJson, const CSimRunFigures&) {
+                fqorvSimAddArchiveTruth(theJson, theScene, theTimeline, *aProduct, aPath);
+            },
+            [aWriter, aProduct] { aWriter->finish(); }};
+}
 
-    const std::unique_ptr<CSimOrbit> aOrbit = fqorvSimMakeOrbit(theScene);
-    const CSimTimeline aTimeline(theScene);
-    const CSimEchoGenerator aGenerator(theScene, *aOrbit, aTimeline);
-    const CSimSceneTruth aTruth = fqorvSimComputeTruth(theScene, *aOrbit, aTimeline);
-    const CSimAlosProduct aProduct = fqorvSimAlosSceneProduct(theScene, aTimeline, *aOrbit, aTruth);
-    CSimAlosWriter aWriter(aProduct, aArchive);
-
-    CSimRunFigures aFigures;
-    const CRecordSink aSink = [&](const CSimRecord& r, std::size_t, const uint8_t* theSamples) {
-        aWriter.writeLine(fqorvSimAlosSceneLine(theScene, aTimeline, aProduct, r), theSamples);
-    };
-    writeRecordsWith(theScene, aTimeline, aGenerator, aSink, aReport, aFigures, theProgress);
-
-    aFigures.mRasterName = aArchive.filename().string();
-    CJson aTruthJson = fqorvSimTruthJson(theScene, aTruth, aTimeline, *aOrbit, aFigures);
-    fqorvSimAddAlosTruth(aTruthJson, theScene, aProduct, aArchive);
-    aTruthJson.dumpFile(aReport.mTruth);
-    aWriter.finish();
-    aReport.mSeconds = secondsSince(aStart);
-    return aReport;
+/// An ALOS product directory.
+CArchiveSink openAlosArchive(const CSimScene& theScene, const std::string& theRoot, const CSimTimeline& theTimeline,
+                             const CSimOrbit& theOrbit, const CSimSceneTruth& theTruth)
+{
+    const std::filesystem::path aPath = theRoot;
+    const auto aProduct = std::make_shared<const CSimAlosProduct>(fqorvSimAlosSceneProduct(theScene, theTimeline, theOrbit, theTruth));
+    const auto aWriter = std::make_shared<CSimAlosWriter>(*aProduct, aPath);
+    return {aPath,
+            [&theScene, &theTimeline, aProduct, aWriter](const CSimRecord& r, std::size_t, const uint8_t* theSamples) {
+                aWriter->writeLine(fqorvSimAlosSceneLine(theScene, theTimeline, *aProduct, r), theSamples);
+            },
+            [&theScene, aProduct, aPath](CJson& theJson, const CSimRunFigures&) {
+                fqorvSimAddAlosTruth(theJson, theScene, *aProduct, aPath);
+            },
+            [aWriter, aProduct] { aWriter->finish(); }};
 }
 
 /// An ASAR product: the instrument and orbit files and the noise packets first, then a packet per
-/// record, the truth file, and the product renamed into place last.
-CSimRunReport runAsar(const CSimScene& theScene, const std::string& theRoot, const CSimProgress& theProgress)
+/// record; the product is renamed into place last.
+CArchiveSink openAsarArchive(const CSimScene& theScene, const std::string& theRoot, const CSimTimeline& theTimeline,
+                             const CSimOrbit& theOrbit, const CSimSceneTruth& theTruth)
 {
-    const auto aStart = std::chrono::steady_clock::now();
-    CSimRunReport aReport;
-    aReport.mRaster = fqorvSimAsarPath(theRoot).string();
-    aReport.mTruth = theRoot + "_truth.json";
-    countTargets(theScene, aReport);
-    std::remove(aReport.mTruth.c_str());
-
-    const std::unique_ptr<CSimOrbit> aOrbit = fqorvSimMakeOrbit(theScene);
-    const CSimTimeline aTimeline(theScene);
-    const CSimEchoGenerator aGenerator(theScene, *aOrbit, aTimeline);
-    const CSimSceneTruth aTruth = fqorvSimComputeTruth(theScene, *aOrbit, aTimeline);
-    CSimAsarScene aProduct(theScene, aTimeline, *aOrbit, aTruth, theRoot);
-    CSimRunFigures aFigures;
-    const CRecordSink aSink = [&](const CSimRecord& r, std::size_t, const uint8_t* theBlocks) {
-        aProduct.writeRecord(r, theBlocks);
-    };
-    writeRecordsWith(theScene, aTimeline, aGenerator, aSink, aReport, aFigures, theProgress);
-
-    aFigures.mRasterName = aProduct.productPath().filename().string();
-    CJson aTruthJson = fqorvSimTruthJson(theScene, aTruth, aTimeline, *aOrbit, aFigures);
-    aProduct.addTruth(aTruthJson, aFigures.mGain);
-    aTruthJson.dumpFile(aReport.mTruth);
-    aProduct.finish();
-    aReport.mSeconds = secondsSince(aStart);
-    return aReport;
+    const auto aProduct = std::make_shared<CSimAsarScene>(theScene, theTimeline, theOrbit, theTruth, theRoot);
+    return {aProduct->productPath(),
+            [aProduct](const CSimRecord& r, std::size_t, const uint8_t* theBlocks) { aProduct->writeRecord(r, theBlocks); },
+            [aProduct](CJson& theJson, const CSimRunFigures& theFigures) { aProduct->addTruth(theJson, theFigures.mGain); },
+            [aProduct] { aProduct->finish(); }};
 }
 
 }  // namespace
 
 CSimRunReport fqorvSimRun(const CSimScene& theScene, const std::string& theRoot, const CSimProgress& theProgress)
 {
-    if (theScene.mArchive == CSimArchive::Alos) return runAlos(theScene, theRoot, theProgress);
-    if (theScene.mArchive == CSimArchive::Asar) return runAsar(theScene, theRoot, theProgress);
-    if (theScene.mArchive != CSimArchive::Raw) return runNative(theScene, theRoot, theProgress);
+    using namespace std::placeholders;
+    if (theScene.mArchive == CSimArchive::Alos)
+        return runArchive(theScene, theRoot, theProgress, std::bind(openAlosArchive, std::cref(theScene), theRoot, _1, _2, _3));
+    if (theScene.mArchive == CSimArchive::Asar)
+        return runArchive(theScene, theRoot, theProgress, std::bind(openAsarArchive, std::cref(theScene), theRoot, _1, _2, _3));
+    if (theScene.mArchive != CSimArchive::Raw)
+        return runArchive(theScene, theRoot, theProgress, std::bind(openErsArchive, std::cref(theScene), theRoot, _1, _2, _3));
     const auto aStart = std::chrono::steady_clock::now();
     CSimRunReport aReport;
     aReport.mRaster = theRoot;
