@@ -13,10 +13,12 @@
 #include <cstdlib>
 #include <cstring>
 #include <memory>
+#include <optional>
 #include <string>
 #include <thread>
 #include <vector>
 
+#include "qorv_column_velocity.h"
 #include "qorv_description_section.h"
 #include "qorv_enviroment.h"
 #include "qorv_errors.h"
@@ -42,6 +44,7 @@ constexpr unsigned CQORV_MAX_BLOCK_SAMPLES = 134217728u;
 constexpr int CQORV_GUARD_MARGIN = 10;  // lines added to the guards of the second pass
 constexpr double CQORV_NORMALIZE_POWER = 16000.0;
 constexpr double CQORV_NULL_LIMIT = 1.1754943508222875e-38;
+constexpr const char* CQORV_AZIMUTH_SETTING = "QORVEX_AZIMUTH";
 
 /// Arguments, header values and the sizes of the run.
 struct CAzSlcParam {
@@ -59,8 +62,10 @@ struct CAzSlcParam {
     double mShift = 0.0;       // s, lines
     int aMmdsk1 = 0;
     CSpaceborneGeometry mGeometry;
+    std::optional<CColumnVelocityModel> mColumnVelocity;  // set in the precise mode only
 
     int nsub() const { return ndec; }
+    bool precise() const { return mColumnVelocity.has_value(); }
     double prf() const { return mGeometry.mIn.mPrf; }
     double bandFraction() const { return mGeometry.mIn.mBandFraction; }
     int lastLine() const { return mLines - 1; }
@@ -116,6 +121,35 @@ void fFftSizes(const CDescriptionHeader& theInput, const CDescriptionHeader& the
     }
 }
 
+/// The azimuth mode of the run: "QORVEX_AZIMUTH" precise or block (block when unset). The precise
+/// mode needs the orbit for its column velocities; without it the block mode focuses, with a warning.
+void fChooseMode(const CDescriptionHeader& theInput, CAzSlcParam& p)
+{
+    const char* aSetting = std::getenv(CQORV_AZIMUTH_SETTING);
+    const std::string aMode = aSetting ? aSetting : "";
+    if (aMode.empty() || aMode == "block") return;
+    if (aMode != "precise") {
+        fdfTrace("Error: %s=%s: the azimuth mode is precise or block\n", CQORV_AZIMUTH_SETTING, aMode.c_str());
+        QORV_FATAL(CQORV_ERR_SETTING_VALUE, (std::string(CQORV_AZIMUTH_SETTING) + "=" + aMode + ": precise or block").c_str());
+    }
+    std::string aReason;
+    p.mColumnVelocity = CColumnVelocityModel::fromHeader(theInput, p.mGeometry.mIn.mVelocity, aReason);
+    if (p.mColumnVelocity) {
+        const double r0 = p.mGeometry.mIn.mNearRange, dr = p.mGeometry.mRangeSpacing;
+        for (const int aLine : {0, p.lastLine()})
+            if (p.mColumnVelocity->velocities(r0, dr, p.nrfft, aLine).empty()) {
+                aReason = "the orbit reaches no target at some range of the swath";
+                p.mColumnVelocity.reset();
+            }
+    }
+    if (!p.mColumnVelocity) {
+        fdfTrace("Warning: precise azimuth mode not possible (%s): block mode\n", aReason.c_str());
+        QORV_WARNING(CQORV_WARN_PRECISE_FALLBACK, ("block mode: " + aReason).c_str());
+        return;
+    }
+    fdfTrace("Azimuth mode: precise (effective velocity per range column)\n");
+}
+
 /// Arguments, headers, sizes and the geometry set-up.
 void fSetUp(int argc, char** argv, YDF_SAR& theSar, std::unique_ptr<CDescriptionHeader>& theInput,
             std::unique_ptr<CDescriptionHeader>& thePar, CAzSlcParam& p)
@@ -158,6 +192,7 @@ void fSetUp(int argc, char** argv, YDF_SAR& theSar, std::unique_ptr<CDescription
     p.mCentroid0 = theSar.getDopplerFromPixel(0.0, 0.0, false, false);
     fdfTrace("TBD NEW_DOPPLER_APPROCH  fd : %f\n", p.mCentroid0);
     p.mGeometry = fqorvSpaceborneGeometry(aIn, p.mCentroid0);
+    fChooseMode(*theInput, p);
 }
 
 /// Step 3: the output header, and the output raster created from it under the temporary name.
@@ -195,6 +230,7 @@ std::unique_ptr<CDescriptionHeader> fOutputHeader(const CDescriptionHeader& theI
     char aText[64];
     std::snprintf(aText, sizeof aText, "%lf", p.mCentroid0);
     fqorvSetUserKey(o, "DOPPLER VALUE(0   0)", aText);
+    fqorvSetUserKey(o, "AZIMUTH FOCUSING", p.precise() ? "precise" : "block");
 
     CRasterFileParam aParam;
     fqorvRasterParamFromHeader(o, p.mWriteName.c_str(), aParam);
@@ -416,13 +452,22 @@ void fProcessSubaperture(YDF_SAR& theSar, CRasterFile& theIn, CRasterFile& theOu
 
     st.mReadSeconds += fLap(aClock);
 
-    // Step 9: the Doppler bin keeps the centroid above; the tables take the one at the final block centre.
-    const int ndc = fqorvDopplerBin(ws2, p.nazft);
+    // Step 9: the Doppler bin keeps the centroid above; the tables take the one at the final block
+    // centre. The precise mode takes both from the final centre.
+    int ndc = fqorvDopplerBin(ws2, p.nazft);
     const int aCentreLine = std::min(theOffset + p.nazft / 2, p.lastLine());
     const double fdNew = theSar.getDopplerFromPixel(p.nrfft / 2, aCentreLine, false, false);
     fdfTrace("TBD NEW_DOPPLER_APPROCH 4 fd : %f\n", fdNew);
     p.mGeometry = fqorvSpaceborneGeometry(p.mGeometry.mIn, fdNew);
     fdc = p.subapertureCentroid(i, fdNew);
+    if (p.precise()) {
+        fqorvSubapertureAngles(p.mGeometry, fdc, ws, ws1, ws2);
+        ndc = fqorvDopplerBin(ws2, p.nazft);
+        const std::vector<double> aVelocities = p.mColumnVelocity->velocities(
+            theFocuser.param().mNearRange, p.mGeometry.mRangeSpacing, p.nrfft, aCentreLine);
+        if (!aVelocities.empty()) theFocuser.setColumnVelocities(aVelocities);
+        else fdfTrace("Warning: no column velocities at line %d: the previous block's are kept\n", aCentreLine);
+    }
     theFocuser.setDoppler(fdc, ndc, p.mShift);
     theFocuser.focus();
     st.mFocusSeconds += fLap(aClock);
@@ -447,6 +492,7 @@ void fProcessBlocks(YDF_SAR& theSar, CRasterFile& theIn, CRasterFile& theOut, CA
 {
     COmegaKParam aKernel = fqorvBlockParam(p.mGeometry, p.nazft, p.nrfft, 0);
     aKernel.mHalfPixelShift = p.mHalfPixelShift;
+    aKernel.mPrecise = p.precise();
     const int aThreads = fqorvThreadCount();
     fqorvFftSetThreads(aThreads);
     COmegaKBlockFocuser aFocuser(aKernel, aThreads);

@@ -16,6 +16,8 @@ const double aTwoPi = 2.0 * M_PI;
 constexpr int CQORV_RECURRENCE_RESEED = 256;
 // Columns handled together by one thread in the reference phase.
 constexpr int CQORV_PHASE_CHUNK = 256;
+// Columns between two exact evaluations of the precise mode's column phase.
+constexpr int CQORV_COLUMN_NODE = 32;
 
 }  // namespace
 
@@ -39,7 +41,11 @@ COmegaKBlockFocuser::COmegaKBlockFocuser(const COmegaKParam& theParam, int theTh
     const int nazft = mParam.mAzimuthFftSize;
     const int nrfft = mParam.mRangeFftSize;
     mK0 = aTwoPi * mParam.mCarrierFrequency / mParam.mSamplingRate;
-    const double nr0 = 2.0 * mParam.mNearRange * mParam.mSamplingRate / CSAR_C;  // near range in samples
+    mNearSamples = 2.0 * mParam.mNearRange * mParam.mSamplingRate / CSAR_C;
+    // The reference range: the near range, or the block's middle column in the precise mode, which
+    // halves the residual of the first-order mapping at the block's edges.
+    mReferenceColumn = mParam.mPrecise ? 0.5 * nrfft : 0.0;
+    const double nr0 = mNearSamples + mReferenceColumn;  // reference range in samples
     mKr.resize(nrfft);
     mInverseKr.resize(nrfft);
     for (int n = 0; n < nrfft; ++n) {
@@ -54,6 +60,19 @@ COmegaKBlockFocuser::COmegaKBlockFocuser(const COmegaKParam& theParam, int theTh
     mKx2.assign(nazft, 0.0);
     mAz.assign(nazft, 0.0);
     mWeight.assign(nazft, 0.0f);
+    if (mParam.mPrecise) {
+        mRangeInversePlan = std::make_unique<FftPlan1D>(nrfft, FftDirection::Inverse);
+        mAzimuthInversePlan = std::make_unique<FftPlanColumns>(nazft, nrfft, FftDirection::Inverse, true);
+        mVelocityRatio2.assign(nrfft, 1.0);
+    }
+}
+
+void COmegaKBlockFocuser::setColumnVelocities(const std::vector<double>& theVelocities)
+{
+    for (int n = 0; n < mParam.mRangeFftSize; ++n) {
+        const double aRatio = mParam.mVelocity / theVelocities.at(n);
+        mVelocityRatio2[n] = aRatio * aRatio;
+    }
 }
 
 int COmegaKBlockFocuser::signedBinDistance(int b) const
@@ -82,6 +101,12 @@ void COmegaKBlockFocuser::setDoppler(double theCentroid, int theDopplerBin, doub
 {
     const int nazft = mParam.mAzimuthFftSize;
     mCentroid = theCentroid;
+    if (mParam.mPrecise) {
+        // Every bin labelled with its own frequency: the centroid moves to the frequency of its bin,
+        // within the band of decimated rate around it (at most half a bin).
+        const double aRate = mParam.mPrf / (static_cast<double>(mParam.mPresumming) * mParam.mDecimation);
+        mCentroid = theCentroid + std::remainder(theDopplerBin * aRate / nazft - theCentroid, aRate);
+    }
     mDopplerBin = theDopplerBin;
     mShift = theShift;
     const double dr = CSAR_C / (2.0 * mParam.mSamplingRate);
@@ -127,7 +152,14 @@ void COmegaKBlockFocuser::focus()
     rangeTransform();
     fdfTrace("Data compression \n");
     referencePhase();
-    inverseTransform();
+    if (!mParam.mPrecise) {
+        inverseTransform();
+        return;
+    }
+    rangeInverseTransform();
+    fdfTrace("Azimuth phase per range column \n");
+    columnPhase();
+    azimuthInverseTransform();
 }
 
 void COmegaKBlockFocuser::azimuthTransform() { mAzimuthPlan.execute(mBlock.data()); }
@@ -143,7 +175,12 @@ void COmegaKBlockFocuser::stoltMapping()
         const double a = -mKx2[b] / (2.0 * mK0);
         const float aRotRe = static_cast<float>(std::cos(a));
         const float aRotIm = static_cast<float>(std::sin(a));
+        // The phase is zero at the reference column.
         float aRe = 1.0f, aIm = 0.0f;
+        if (mReferenceColumn != 0.0) {
+            aRe = static_cast<float>(std::cos(-a * mReferenceColumn));
+            aIm = static_cast<float>(std::sin(-a * mReferenceColumn));
+        }
         fcomplex* aRow = mBlock[b];
         for (int n = 0; n < nrfft; ++n) {
             const float sRe = aRow[n].real(), sIm = aRow[n].imag();
@@ -252,6 +289,62 @@ void COmegaKBlockFocuser::referencePhase()
 }
 
 void COmegaKBlockFocuser::inverseTransform() { mInversePlan.execute(mBlock.data()); }
+
+void COmegaKBlockFocuser::rangeInverseTransform()
+{
+    const int nazft = mParam.mAzimuthFftSize;
+#pragma omp parallel for num_threads(mThreads) schedule(static)
+    for (int b = 0; b < nazft; ++b)
+        if (mWeight[b] != 0.0f) mRangeInversePlan->execute(mBlock[b]);
+}
+
+void COmegaKBlockFocuser::azimuthInverseTransform() { mAzimuthInversePlan->execute(mBlock.data()); }
+
+double COmegaKBlockFocuser::residualPhase(double theKx, int theColumn) const
+{
+    // After the block stages a target at column n keeps, at the centre of the range band, the phase
+    // n0 (k0 - sqrt((k0 + d)^2 - kt^2)) with n0 its range in samples, d = kx^2 / (2 k0) the shift of
+    // the first-order mapping and kt = kx v / Vr its true azimuth wavenumber: the quartic and higher
+    // terms of the hyperbola and the difference between the processing and the effective velocity.
+    const double k0 = mK0;
+    const double aKx2 = theKx * theKx;
+    const double d = aKx2 / (2.0 * k0);
+    const double aExcess = aKx2 * (1.0 - mVelocityRatio2[theColumn]) + d * d;  // (k0 + d)^2 - kt^2 - k0^2
+    const double n0 = mNearSamples + theColumn;
+    return -n0 * aExcess / (k0 + std::sqrt(k0 * k0 + aExcess));
+}
+
+void COmegaKBlockFocuser::columnPhase()
+{
+    const int nazft = mParam.mAzimuthFftSize;
+    const int nrfft = mParam.mRangeFftSize;
+    // The phase is smooth across range: exact every CQORV_COLUMN_NODE columns, linear between them
+    // through a double-precision phasor (its curvature leaves far below a milliradian).
+#pragma omp parallel for num_threads(mThreads) schedule(static)
+    for (int b = 0; b < nazft; ++b) {
+        if (mWeight[b] == 0.0f) continue;
+        fcomplex* aRow = mBlock[b];
+        const double aKx = mKx[b];
+        double aAtStart = residualPhase(aKx, 0);
+        for (int n0 = 0; n0 < nrfft; n0 += CQORV_COLUMN_NODE) {
+            const int n1 = std::min(n0 + CQORV_COLUMN_NODE, nrfft - 1);
+            const double aAtEnd = residualPhase(aKx, n1);
+            const double aStep = n1 > n0 ? -(aAtEnd - aAtStart) / (n1 - n0) : 0.0;
+            double pRe = std::cos(-aAtStart), pIm = std::sin(-aAtStart);
+            const double rRe = std::cos(aStep), rIm = std::sin(aStep);
+            const int aEnd = std::min(n0 + CQORV_COLUMN_NODE, nrfft);
+            for (int n = n0; n < aEnd; ++n) {
+                const float fRe = static_cast<float>(pRe), fIm = static_cast<float>(pIm);
+                const float sRe = aRow[n].real(), sIm = aRow[n].imag();
+                aRow[n] = fcomplex(sRe * fRe - sIm * fIm, sRe * fIm + sIm * fRe);
+                const double aNextRe = pRe * rRe - pIm * rIm;
+                pIm = pRe * rIm + pIm * rRe;
+                pRe = aNextRe;
+            }
+            aAtStart = aAtEnd;
+        }
+    }
+}
 
 void COmegaKBlockFocuser::clearGuards(int theColumn, int theM1, int theM2)
 {

@@ -1,9 +1,15 @@
 // The omega-k block focuser: one azimuth block of range compressed lines, carried into the 2-D
 // frequency domain, Stolt-mapped to first order, multiplied by the reference phase and the azimuth
 // weights, and returned to the image domain. Plans, block and per-bin tables are made once.
+//
+// In the precise mode the block keeps every stage and adds what the first-order mapping and the
+// one processing velocity leave: the reference range lies at the block's middle column, the bins
+// are labelled with their own frequencies, and between the inverse range and the inverse azimuth
+// transforms each range column takes the exact azimuth phase of its own effective velocity.
 #pragma once
 
 #include <algorithm>
+#include <memory>
 #include <vector>
 
 #include "qorv_complex.h"
@@ -23,6 +29,7 @@ struct COmegaKParam {
     int mPresumming = 1;           // psf
     int mDecimation = 1;           // ndec
     bool mHalfPixelShift = false;  // adds a half-line shift to the reference phase
+    bool mPrecise = false;         // the precise mode (column velocities, exact azimuth phase)
 };
 
 /// Doppler bin of the block: nint(nazft ws2 / (2 pi)) modulo nazft, where ws2 (radians per
@@ -42,6 +49,9 @@ public:
     /// the centring shift theShift (lines). Fills kx, kx2, az and the Kaiser 2.12 weights.
     void setDoppler(double theCentroid, int theDopplerBin, double theShift);
 
+    /// Precise mode: the effective velocity (m/s) of each of the nrfft range columns.
+    void setColumnVelocities(const std::vector<double>& theVelocities);
+
     /// Every azimuth bin weighted 1: the look steps focus without the azimuth weights.
     void setUniformWeights() { std::fill(mWeight.begin(), mWeight.end(), 1.0f); }
 
@@ -58,6 +68,12 @@ public:
     /// The same, each sample's sine and cosine evaluated directly (reference for the tests).
     void referencePhaseDirect();
     void inverseTransform();
+    /// Precise mode: the inverse transform in two halves with the column phase between them.
+    void rangeInverseTransform();
+    /// Precise mode, in the range-time / azimuth-frequency domain: each column's residual azimuth
+    /// phase, the exact hyperbola of its own velocity less what the block stages compensated.
+    void columnPhase();
+    void azimuthInverseTransform();
 
     /// Clears rows 0 .. min(theM1, nazft)-1 and nazft-theM2 .. nazft-1 of column theColumn.
     void clearGuards(int theColumn, int theM1, int theM2);
@@ -69,6 +85,8 @@ public:
 private:
     int signedBinDistance(int b) const;
     double halfShift(int b) const;
+    /// The residual azimuth phase (radians) at azimuth wavenumber theKx and range column theColumn.
+    double residualPhase(double theKx, int theColumn) const;
 
     COmegaKParam mParam;
     int mThreads;
@@ -76,6 +94,11 @@ private:
     FftPlanColumns mAzimuthPlan;
     FftPlan1D mRangePlan;
     FftPlan2D mInversePlan;
+    std::unique_ptr<FftPlan1D> mRangeInversePlan;       // precise mode
+    std::unique_ptr<FftPlanColumns> mAzimuthInversePlan;  // precise mode
+    double mReferenceColumn = 0.0;      // column of the reference range: 0, or nrfft/2 when precise
+    double mNearSamples = 0.0;          // slant range of column 0 in range samples
+    std::vector<double> mVelocityRatio2;  // precise: (v / Vr[n])^2 per column
     double mK0 = 0.0;                   // 2 pi f0 / fs, radians per range sample
     double mScale = 0.0;                // 1 / (nazft nrfft)
     std::vector<double> mKr;            // 2 (k0 + w[n]) / nr0

@@ -33,6 +33,7 @@ inline constexpr int CQORV_ERR_POST_FOCUS_3 = 652803;
 inline constexpr int CQORV_ERR_POST_FOCUS_4 = 652804;
 inline constexpr int CQORV_ERR_RASTER_SIZES_DIFFER = 652807;    // two rasters' sizes differ
 inline constexpr int CQORV_ERR_SETTING_MISSING = 783360;        // a setting of the environment is missing
+inline constexpr int CQORV_ERR_SETTING_VALUE = 783361;          // a setting of the environment holds an unknown value
 inline constexpr int CQORV_ERR_KEY_FILE = 848640;               // a key file's content is wrong
 inline constexpr int CQORV_ERR_MANDATORY = 848641;              // a mandatory file or a field's value is wrong
 inline constexpr int CQORV_ERR_UNKNOWN_KEY = 848642;            // unknown field key
@@ -62,6 +63,7 @@ inline constexpr int CQORV_WARNINGS_PSEUDO_ID = 65280;          // a run that en
 // Warning ids, numbered in the warning catalogue.
 inline constexpr int CQORV_WARN_65281 = 65281;
 inline constexpr int CQORV_WARN_COORDINATES = 65283;           // scene coordinates missing, derived instead
+inline constexpr int CQORV_WARN_PRECISE_FALLBACK = 65284;      // the precise azimuth mode fell back to the block mode
 inline constexpr int CQORV_WARN_130561 = 130561;
 inline constexpr int CQORV_WARN_IMPORT_TRUNCATED = 195841;     // data file truncated, its whole lines imported
 inline constexpr int CQORV_WARN_IMPORT_ONE_VECTOR = 195842;    // orbit propagated from a single state vector

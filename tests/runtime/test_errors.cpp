@@ -39,7 +39,7 @@ TEST_F(CatalogTest, DeliveredCataloguesHaveATextForEveryIdOfTheTable)
 {
     ASSERT_TRUE(mErrors.read((qtest::sourceShareDir() / "des" / "qorv_errors_catalog.des").c_str()));
     for (int aId : {130560, 195840, 261120, 261121, 261122, 261123, 261124, 261125, 261126, 326400, 456960,
-                    456961, 456962, 456965, 522240, 587520, 652802, 652803, 652804, 652807, 783360, 848640,
+                    456961, 456962, 456965, 522240, 587520, 652802, 652803, 652804, 652807, 783360, 783361, 848640,
                     848641, 848642, 848644, 848645, 848646, 848647, 913920, 913921, 913922}) {
         mErrors.getErrorText(aId, mPrimary, mSecondary);
         EXPECT_STRNE(mPrimary, "GENERIC ERROR WRONG CODE") << aId;
@@ -52,7 +52,7 @@ TEST_F(CatalogTest, DeliveredCataloguesHaveATextForEveryIdOfTheTable)
     }
     CErrorCatalog aWarnings;
     ASSERT_TRUE(aWarnings.read((qtest::sourceShareDir() / "des" / "qorv_warnings_catalog.des").c_str()));
-    for (int aId : {65281, 65283, 130561}) {
+    for (int aId : {65281, 65283, 65284, 130561}) {
         aWarnings.getErrorText(aId, mPrimary, mSecondary);
         EXPECT_GT(std::strlen(mSecondary), 0u) << aId;
     }
