@@ -44,6 +44,8 @@ std::string helpText()
            "                         3 (autofocus); repeatable [none]\n"
            "  --no-ambiguity         no Doppler ambiguity resolution [on]\n"
            "  --doppler-degree N     azimuth degree of the Doppler table, 0 to 5 [1]\n"
+           "  --azimuth MODE         omega-k focusing: precise (each range column at its own effective velocity\n"
+           "                         from the orbit) or block (one velocity per block) [precise]\n"
            "  --jobs N               scenes focused at once [1]\n"
            "  --json FILE            write the summary as JSON to FILE [none]\n"
            "  --orbit FILE           state vectors for the archives' import (qorvex-import --help) [the archive's]\n"
@@ -101,6 +103,10 @@ Options parseOptions(int argc, const char* const* argv)
             o.mAmbiguity = false;
         } else if (a == "--doppler-degree") {
             o.mDopplerDegree = toInt(value(i, a), a, 0, 5);
+        } else if (a == "--azimuth") {
+            o.mAzimuth = value(i, a);
+            if (o.mAzimuth != "precise" && o.mAzimuth != "block")
+                throw std::invalid_argument("--azimuth wants precise or block, not \"" + o.mAzimuth + "\"");
         } else if (a == "--jobs") {
             o.mJobs = toInt(value(i, a), a, 1, 256);
         } else if (a == "--json") {

@@ -21,6 +21,7 @@ struct Options {
     bool mSkip[4] = {false, false, false, false};  // steps 0 to 3
     bool mAmbiguity = true;
     int mDopplerDegree = 1;
+    std::string mAzimuth = "precise";  // azimuth mode of the omega-k step: precise or block
     int mJobs = 1;
     fs::path mJson;                 // summary for scripts; empty: none
     fs::path mConfig;               // directory of Qorvex_configuration.ini; empty: found

@@ -235,6 +235,7 @@ int main(int argc, char** argv)
             return 0;
         }
         aConfig = findConfiguration(o.mConfig, aExeDir);
+        setenv("QORVEX_AZIMUTH", o.mAzimuth.c_str(), 1);  // the drivers inherit the azimuth mode
     } catch (const std::exception& e) {
         std::fprintf(stderr, "qorvex-focus: %s\n", e.what());
         return 2;

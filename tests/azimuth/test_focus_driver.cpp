@@ -138,6 +138,44 @@ TEST(FocusDriver, SimulatedErsTargetsFocusToTheirIdealResponses)
     }
     qtest::expectIdealTargets(aBox, aBox.data() / "ers_blocks_slc", aTruthFile, 6);
 
+    // The precise mode on the same product: every target within hundredths of a line, the mode in
+    // the header; an unknown mode is refused, and with too few state vectors for the orbit the block
+    // mode focuses with a warning.
+    {
+        qtest::InProcessEnvironment aEnv;
+        auto aStep = [&](const char* theMode, const std::string& theSlc) {
+            setenv("QORVEX_AZIMUTH", theMode, 1);
+            std::vector<std::string> aStepArgs = {"SAR azimuth omega/k processor", (aBox.data() / "ers_rc").string(),
+                                                  (aBox.data() / theSlc).string(), (aBox.data() / "ers_par").string(),
+                                                  "1", "1", "4096", "0", "0"};
+            std::vector<char*> aArgv;
+            for (std::string& a : aStepArgs) aArgv.push_back(a.data());
+            const int aResult = qorv_az_SLC(static_cast<int>(aArgv.size()), aArgv.data());
+            unsetenv("QORVEX_AZIMUTH");
+            return aResult;
+        };
+        ASSERT_EQ(aStep("precise", "ers_precise_slc"), 0);
+        auto aSlc = CDescriptionHeader::makeFull();
+        ASSERT_TRUE(aSlc->read((aBox.data() / "ers_precise_slc_hdr").c_str(), true));
+        std::string aMode;
+        EXPECT_TRUE(fqorvGetUserKey(*aSlc, "AZIMUTH FOCUSING", aMode));
+        EXPECT_EQ(aMode, "precise");
+
+        auto aHeader = CDescriptionHeader::makeFull();
+        const std::string aRcHeader = (aBox.data() / "ers_rc_hdr").string();
+        ASSERT_TRUE(aHeader->read(aRcHeader.c_str(), true));
+        const int aVectors = (*aHeader)["StateVectorData.nStateVectors"].getInteger();
+        (*aHeader)["StateVectorData.nStateVectors"].setValue(3);
+        ASSERT_TRUE(aHeader->write(aRcHeader.c_str(), true, false));
+        ASSERT_EQ(aStep("precise", "ers_fallback_slc"), 0);
+        EXPECT_NE(aEnv.trace().find("precise azimuth mode not possible"), std::string::npos);
+        (*aHeader)["StateVectorData.nStateVectors"].setValue(aVectors);
+        ASSERT_TRUE(aHeader->write(aRcHeader.c_str(), true, false));
+        EXPECT_QORV_FAILURE(aStep("fast", "ers_fast_slc"), 783361);
+        unsetenv("QORVEX_AZIMUTH");
+    }
+    qtest::expectIdealTargets(aBox, aBox.data() / "ers_precise_slc", aTruthFile, 6, 1.5, 0.05, 0.02);
+
     // State vectors announced without velocities: failure 848642 naming the field, and no product.
     {
         qtest::InProcessEnvironment aEnv;

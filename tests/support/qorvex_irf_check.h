@@ -13,6 +13,7 @@ namespace qtest {
 /// and ISLR within 1.5 dB (the azimuth PSLR within theAzimuthPslrDb). theTargets: the number
 /// expected (0: any, and the table is printed).
 void expectIdealTargets(const DriverSandbox& theBox, const std::filesystem::path& theSlc,
-                        const std::filesystem::path& theTruth, std::size_t theTargets, double theAzimuthPslrDb = 1.5);
+                        const std::filesystem::path& theTruth, std::size_t theTargets, double theAzimuthPslrDb = 1.5,
+                        double theLineError = 0.25, double thePixelError = 0.1);
 
 }  // namespace qtest
