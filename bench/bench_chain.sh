@@ -37,6 +37,10 @@ printf '%s\n' "bench: full ERS frame" "$dir/ers_raw" OK "$dir/ers_slc" 1 5 NotOK
 # Each configuration runs QORVEX_BENCH_ROUNDS times (2); the fastest run and the fastest FFT work
 # count, since the virtual machines' neighbours slow single runs by up to a third.
 rounds=${QORVEX_BENCH_ROUNDS:-2}
+# Both azimuth modes side by side in the same run: the block mode (one velocity per block) and the
+# precise mode (each range column at its own effective velocity).
+for mode in block precise; do
+export QORVEX_AZIMUTH=$mode
 for threads in 1 2; do
   wall=""; fftsec=""
   for round in $(seq "$rounds"); do
@@ -60,7 +64,7 @@ for threads in 1 2; do
     fs=$(sed -n 's/.*FFT work \([0-9.]*\) s.*/\1/p' <<< "$f")
     if [ -z "$fftsec" ] || awk -v a="$fs" -v b="$fftsec" 'BEGIN { exit !(a < b) }'; then fftsec=$fs; fft=$f; fi
   done
-  echo "== $threads thread(s), best of $rounds: wall $wall s, peak memory $((rss / 1024)) MB, $blocks blocks of $nazft x $nrfft"
+  echo "== $mode mode, $threads thread(s), best of $rounds: wall $wall s, peak memory $((rss / 1024)) MB, $blocks blocks of $nazft x $nrfft"
   sed -n 's/^DURATION \[\(.*\)\]  (s) = \(.*\)/   step "\1": \2 s/p' "$dir/best.trace"
   echo "   FFT work alone: $fft"
   awk -v w="$wall" -v f="$fftsec" 'BEGIN { printf "   ratio of the wall time to the FFT work: %.2f\n", w / f }'
@@ -69,8 +73,10 @@ for threads in 1 2; do
   awk -v r="$rcsec" -v f="$rgsec" 'BEGIN { printf "   range compression against its own transforms: %.2f\n", r / f }'
 done
 
-echo "== point targets of the SLC of steps 0, 2 and 5 against the simulator's truth (worst case)"
-"$bin/qorvex_irf" --slc "$dir/ers_slc" --truth "$dir/ers_raw_truth.json" --json "$dir/irf.json" | tail -n 6
+echo "== $mode mode: point targets of the SLC of steps 0, 2 and 5 against the simulator's truth (worst case)"
+"$bin/qorvex_irf" --slc "$dir/ers_slc" --truth "$dir/ers_raw_truth.json" --json "$dir/irf_$mode.json" | tail -n 6
+done
+unset QORVEX_AZIMUTH
 
 # The whole chain on the same frame, two threads: every estimator runs (its estimate on a frame of
 # isolated targets is not the point here, its cost is).
