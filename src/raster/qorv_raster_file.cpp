@@ -33,11 +33,19 @@ QorvTiffHeaderWriter gTiffHeaderWriter = nullptr;
 constexpr std::size_t CQORV_RF_STREAM_BUFFER = 1u << 20;
 constexpr std::size_t CQORV_RF_DIRECT_RECORD = 32u << 10;
 
-std::size_t streamBufferSize(int theRecordLen)
+// A file only read never fills more of the buffer than it holds: a small one (a quick-look, a
+// short raw product) gets a buffer of its whole records, at least one.
+std::size_t streamBufferSize(int theRecordLen, FILE* theStream, bool theReadOnly)
 {
     const std::size_t aRecord = static_cast<std::size_t>(theRecordLen);
-    if (aRecord >= CQORV_RF_DIRECT_RECORD) return std::min(aRecord, CQORV_RF_STREAM_BUFFER);
-    return (CQORV_RF_STREAM_BUFFER / aRecord) * aRecord;
+    std::size_t aSize = aRecord >= CQORV_RF_DIRECT_RECORD ? std::min(aRecord, CQORV_RF_STREAM_BUFFER)
+                                                         : (CQORV_RF_STREAM_BUFFER / aRecord) * aRecord;
+    struct stat aStat;
+    if (theReadOnly && fstat(fileno(theStream), &aStat) == 0 && S_ISREG(aStat.st_mode)) {
+        const std::size_t aFile = static_cast<std::size_t>(std::max<off_t>(aStat.st_size, 1));
+        aSize = std::min(aSize, (aFile + aRecord - 1) / aRecord * aRecord);
+    }
+    return aSize;
 }
 
 const char* statusHeading(int theStatus)
@@ -231,7 +239,7 @@ void CRasterFile::openStream(int theMode)
         failWith(theMode == CQORV_RF_OPEN_READ ? CQORV_ERR_MISSING_FILE : CQORV_ERR_RASTER_ACCESS,
                  fqorvStringFormat("Error: cannot open the file: %s  errno = %d\n", aName, aErrno));
     }
-    mStreamBuffer.assign(streamBufferSize(mRecordLen), 0);
+    mStreamBuffer.assign(streamBufferSize(mRecordLen, mStream, theMode == CQORV_RF_OPEN_READ), 0);
     setvbuf(mStream, mStreamBuffer.data(), _IOFBF, mStreamBuffer.size());
 }
 

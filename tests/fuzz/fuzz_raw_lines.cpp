@@ -255,8 +255,13 @@ void readAll(CRasterFile& f, const CExpected& e)
     }
 
     if (p.mCache > 0) {
-        // As a step sizes its cache: lines within a memory budget.
-        const int aCapacity = static_cast<int>(std::min<int64_t>(p.mCache, std::max<int64_t>(1, CACHE_BYTES / f.getLineBytes())));
+        // As a step sizes its cache: lines within a memory budget. A window never reaches beyond
+        // the image, and one of a record more than the file holds reaches beyond the file from
+        // wherever it starts, as any longer one does: a larger cache would read and fail alike,
+        // and only cost its memory (up to the budget, zeroed, on every execution).
+        const int64_t aBudget = std::max<int64_t>(1, CACHE_BYTES / f.getLineBytes());
+        const int64_t aInFile = std::max<int64_t>(0, static_cast<int64_t>(e.mSize) - p.mHeader) / e.mRecord + 1;
+        const int aCapacity = static_cast<int>(std::min<int64_t>({p.mCache, aBudget, std::max(aLines, 1), aInFile}));
         QFUZZ_CLEAN_FAILURES(f.setLineCache(aCapacity));
         for (const int r : {0, p.mRow % aLines, aLines - 1, 1}) readTyped(f, e, r, 0, -1, "read through the cache");
         readTyped(f, e, p.mRow % aLines, p.mColStart, p.mColEnd, "partial read through the cache");
