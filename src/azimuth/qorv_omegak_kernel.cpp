@@ -35,8 +35,7 @@ COmegaKBlockFocuser::COmegaKBlockFocuser(const COmegaKParam& theParam, int theTh
       mThreads(std::max(theThreads, 1)),
       mBlock(theParam.mAzimuthFftSize, theParam.mRangeFftSize),
       mAzimuthPlan(theParam.mAzimuthFftSize, theParam.mRangeFftSize, FftDirection::Forward, true),
-      mRangePlan(theParam.mRangeFftSize, FftDirection::Forward),
-      mInversePlan(theParam.mAzimuthFftSize, theParam.mRangeFftSize, FftDirection::Inverse, true)
+      mRangePlan(theParam.mRangeFftSize, FftDirection::Forward)
 {
     const int nazft = mParam.mAzimuthFftSize;
     const int nrfft = mParam.mRangeFftSize;
@@ -64,6 +63,8 @@ COmegaKBlockFocuser::COmegaKBlockFocuser(const COmegaKParam& theParam, int theTh
         mRangeInversePlan = std::make_unique<FftPlan1D>(nrfft, FftDirection::Inverse);
         mAzimuthInversePlan = std::make_unique<FftPlanColumns>(nazft, nrfft, FftDirection::Inverse, true);
         mVelocityRatio2.assign(nrfft, 1.0);
+    } else {
+        mInversePlan = std::make_unique<FftPlan2D>(nazft, nrfft, FftDirection::Inverse, true);
     }
 }
 
@@ -288,7 +289,7 @@ void COmegaKBlockFocuser::referencePhase()
     }
 }
 
-void COmegaKBlockFocuser::inverseTransform() { mInversePlan.execute(mBlock.data()); }
+void COmegaKBlockFocuser::inverseTransform() { mInversePlan->execute(mBlock.data()); }
 
 void COmegaKBlockFocuser::rangeInverseTransform()
 {

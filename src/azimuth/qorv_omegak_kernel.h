@@ -93,9 +93,10 @@ private:
     CQorvMatrix<fcomplex> mBlock;
     FftPlanColumns mAzimuthPlan;
     FftPlan1D mRangePlan;
-    FftPlan2D mInversePlan;
-    std::unique_ptr<FftPlan1D> mRangeInversePlan;       // precise mode
-    std::unique_ptr<FftPlanColumns> mAzimuthInversePlan;  // precise mode
+    // The inverse: one 2-D plan in the block mode, rows and columns apart in the precise mode.
+    std::unique_ptr<FftPlan2D> mInversePlan;
+    std::unique_ptr<FftPlan1D> mRangeInversePlan;
+    std::unique_ptr<FftPlanColumns> mAzimuthInversePlan;
     double mReferenceColumn = 0.0;      // column of the reference range: 0, or nrfft/2 when precise
     double mNearSamples = 0.0;          // slant range of column 0 in range samples
     std::vector<double> mVelocityRatio2;  // precise: (v / Vr[n])^2 per column

@@ -141,6 +141,27 @@ void fFocus(const CPointScene& s, COmegaKBlockFocuser& theFocuser)
     theFocuser.focus();
 }
 
+/// Focuses the scene's target (in the precise mode all columns at theColumnVelocity) and measures it.
+CIrfResponse fFocusAndMeasure(const CPointScene& s, COmegaKBlockFocuser& theFocuser, double theColumnVelocity)
+{
+    const COmegaKParam& p = s.mParam;
+    if (p.mPrecise) theFocuser.setColumnVelocities(std::vector<double>(p.mRangeFftSize, theColumnVelocity));
+    fFocus(s, theFocuser);
+    CIrfOptions aOptions;
+    int aLine0 = 0, aPixel0 = 0, aSize = 0;
+    fqorvIrfRegion(s.mTargetLine, s.mTargetPixel, aOptions, aLine0, aPixel0, aSize);
+    CIrfChip aRegion(aSize, aSize, aLine0, aPixel0);
+    for (int l = 0; l < aSize; ++l)
+        for (int n = 0; n < aSize; ++n) {
+            const int r = aLine0 + l, col = aPixel0 + n;
+            if (r >= 0 && r < p.mAzimuthFftSize && col >= 0 && col < p.mRangeFftSize)
+                aRegion.at(l, n) = theFocuser.block()[r][col];
+        }
+    double aAzCentre = s.mCentroid / p.mPrf;
+    aAzCentre -= std::floor(aAzCentre + 0.5);
+    return fqorvIrfAnalyseTarget(aRegion, s.mTargetLine, s.mTargetPixel, aOptions, aAzCentre, 0.0);
+}
+
 TEST(BlockFocuser, PointTargetsMatchTheIdealResponse)
 {
     const COmegaKParam p = fErsParam();
@@ -154,21 +175,7 @@ TEST(BlockFocuser, PointTargetsMatchTheIdealResponse)
         s.mCentroid = aCentroid;
         s.mTargetLine = aCentroid == 0.0 ? 2048.0 : 3000.0;
         s.mTargetPixel = 40.0;
-        fFocus(s, aFocuser);
-
-        CIrfOptions aOptions;
-        int aLine0 = 0, aPixel0 = 0, aSize = 0;
-        fqorvIrfRegion(s.mTargetLine, s.mTargetPixel, aOptions, aLine0, aPixel0, aSize);
-        CIrfChip aRegion(aSize, aSize, aLine0, aPixel0);
-        for (int l = 0; l < aSize; ++l)
-            for (int n = 0; n < aSize; ++n) {
-                const int r = aLine0 + l, col = aPixel0 + n;
-                if (r >= 0 && r < p.mAzimuthFftSize && col >= 0 && col < p.mRangeFftSize)
-                    aRegion.at(l, n) = aFocuser.block()[r][col];
-            }
-        double aAzCentre = aCentroid / p.mPrf;
-        aAzCentre -= std::floor(aAzCentre + 0.5);
-        const CIrfResponse aResponse = fqorvIrfAnalyseTarget(aRegion, s.mTargetLine, s.mTargetPixel, aOptions, aAzCentre, 0.0);
+        const CIrfResponse aResponse = fFocusAndMeasure(s, aFocuser, 0.0);
         ASSERT_TRUE(aResponse.mFound) << aResponse.mNote;
         const CIrfCut aIdealAz = fqorvIrfIdealAzimuth(p.mPrf, p.mBandFraction, aCentroid, 0.0, p.mVelocity, 16);
         EXPECT_NEAR(aResponse.mPixel, s.mTargetPixel, 0.1);
@@ -212,27 +219,6 @@ TEST(BlockFocuser, FastReferencePhaseAndThreadsKeepTheProduct)
     aTwo.focus();
     EXPECT_EQ(std::memcmp(aFast.block().data(), aTwo.block().data(),
                           aFast.block().nRows() * aFast.block().nCols() * sizeof(fcomplex)), 0);
-}
-
-/// Focuses the scene's target (all columns at theColumnVelocity in the precise mode) and measures it.
-CIrfResponse fFocusAndMeasure(const CPointScene& s, COmegaKBlockFocuser& theFocuser, double theColumnVelocity)
-{
-    const COmegaKParam& p = s.mParam;
-    if (p.mPrecise) theFocuser.setColumnVelocities(std::vector<double>(p.mRangeFftSize, theColumnVelocity));
-    fFocus(s, theFocuser);
-    CIrfOptions aOptions;
-    int aLine0 = 0, aPixel0 = 0, aSize = 0;
-    fqorvIrfRegion(s.mTargetLine, s.mTargetPixel, aOptions, aLine0, aPixel0, aSize);
-    CIrfChip aRegion(aSize, aSize, aLine0, aPixel0);
-    for (int l = 0; l < aSize; ++l)
-        for (int n = 0; n < aSize; ++n) {
-            const int r = aLine0 + l, col = aPixel0 + n;
-            if (r >= 0 && r < p.mAzimuthFftSize && col >= 0 && col < p.mRangeFftSize)
-                aRegion.at(l, n) = theFocuser.block()[r][col];
-        }
-    double aAzCentre = s.mCentroid / p.mPrf;
-    aAzCentre -= std::floor(aAzCentre + 0.5);
-    return fqorvIrfAnalyseTarget(aRegion, s.mTargetLine, s.mTargetPixel, aOptions, aAzCentre, 0.0);
 }
 
 TEST(PreciseFocuser, TargetsOfAnotherVelocityAndAtLBandFocusAtTheIdeal)

@@ -1,9 +1,9 @@
 // Raw products of ASAR and ALOS archives: the window, carrier and chirp each family's values give,
-// and products written from hand-made packets and records, read back byte by byte as the chain
-// reads them.
+// and an ALOS product written from hand-made records (a repeat, lost lines filled, a slant range
+// switch), read back byte by byte as the chain reads them. The ASAR packets' decoding is checked by
+// the simulator's round trip and the imports focused end to end.
 #include <gtest/gtest.h>
 
-#include <bit>
 #include <cmath>
 #include <cstdint>
 #include <cstring>
@@ -37,7 +37,6 @@ uint32_t be32(const Bytes& b, std::size_t at)
     return (uint32_t{b[at]} << 24) | (uint32_t{b[at + 1]} << 16) | (uint32_t{b[at + 2]} << 8) | b[at + 3];
 }
 unsigned be16(const Bytes& b, std::size_t at) { return (unsigned{b[at]} << 8) | b[at + 1]; }
-float beFloat(const Bytes& b, std::size_t at) { return std::bit_cast<float>(be32(b, at)); }
 
 Bytes readBytes(const fs::path& thePath)
 {
@@ -149,90 +148,6 @@ TEST(NativeProducts, EachFamilyGivesItsWindowCarrierAndChirp)
 
 // ------------------------------------------------------------------------------------------------
 // Products written and read back
-
-/// The value of the 4-bit code theCode of a block theId under the tables of fArchive: the levels of
-/// the codes 8 .. 15 are the table's rows 7 .. 0, those of 0 .. 7 its rows 8 .. 15.
-float fbaqValue(int theCode, int theId, bool theQ)
-{
-    const int aRow = theCode >= 8 ? 15 - theCode : 8 + theCode;
-    return (theQ ? -1.0f : 1.0f) * static_cast<float>(256 * aRow + theId) * 1e-3f;
-}
-
-TEST(NativeProducts, AsarPacketsDecodeIntoBigEndianLines)
-{
-    // 40 packets back to back behind 3203 bytes of headers; packet 10 is a noise packet, odd
-    // packets hold a short last block (135 samples), even ones two whole blocks (126).
-    qtest::InProcessEnvironment aEnv;   // the header's key files
-    qtest::TempDir aDir;
-    CNativeArchive a = fArchive(ENativeFamily::Asar);
-    a.mLayout.mDataFile = aDir / "asar.N1";
-    Bytes aFile(3203, 0x11);
-    std::vector<CRecordCodes> aCodes;
-    for (int k = 0; k < 40; ++k) {
-        const std::size_t aBlocks = k % 2 ? 2 * 64 + 10 : 2 * 64;
-        CRecordCodes c;
-        c.mMarker = true;
-        c.mEcho = k != 10;
-        c.mCounter = 0xFFFFF0u + static_cast<uint32_t>(k);   // wraps at packet 16
-        c.mClock = static_cast<int64_t>(std::floor((kStart + k * kAsarPri / kAsarFs) * 1e6));
-        c.mSwst = 6000;
-        c.mPri = kAsarPri;
-        c.mOffset = aFile.size();
-        c.mLength = static_cast<uint32_t>(68 + aBlocks);
-        aCodes.push_back(c);
-        Bytes aPacket(c.mLength, 0x22);   // the header bytes do not reach the product
-        for (std::size_t j = 0; j < aBlocks; ++j)
-            aPacket[68 + j] = static_cast<uint8_t>(j % 64 == 0 ? (k + j / 64) % 256 : (k * 7 + j * 13) & 0xFF);
-        aFile.insert(aFile.end(), aPacket.begin(), aPacket.end());
-    }
-    writeBytes(a.mLayout.mDataFile, aFile);
-
-    const CLinePlan aPlan = fqorvPlanLines(aCodes, a);
-    ASSERT_EQ(aPlan.mProducts.size(), 1u);
-    const CPlannedProduct& p = aPlan.mProducts.front();
-    ASSERT_EQ(p.mSamples, 135);
-    const CProductDescription d = fqorvDescribeProduct(a, p, {}, "");
-    CNativeRecordFile aRecords(a.mLayout);
-    fqorvWriteRawProduct(a, aRecords, p, d, aDir / "asar_raw");
-
-    const Bytes aRaw = readBytes(aDir / "asar_raw");
-    const std::size_t aLine = 64 + 8 * 135;
-    ASSERT_EQ(aRaw.size(), 39 * aLine);
-    for (std::size_t i = 0; i < 39; ++i) {
-        const int k = static_cast<int>(i < 10 ? i : i + 1);   // the packet of line i
-        SCOPED_TRACE(k);
-        const std::size_t at = i * aLine;
-        EXPECT_EQ(be32(aRaw, at + 54), static_cast<uint32_t>(k + 1)) << "the noise packet's pulse is a gap";
-        EXPECT_EQ(be16(aRaw, at + 58), 6000u);
-        EXPECT_EQ(be16(aRaw, at + 60), static_cast<unsigned>(kAsarPri));
-        EXPECT_EQ(aRaw[at + 0], 0);
-        const std::size_t aSamples = k % 2 ? 135 : 126;
-        for (std::size_t s = 0; s < 135; ++s) {
-            const std::size_t aByte = 68 + s / 63 * 64 + 1 + s % 63;
-            const int aId = static_cast<int>((k + s / 63) % 256);
-            const int aCode = s < aSamples ? aFile[aCodes[k].mOffset + aByte] : -1;
-            const float aI = aCode < 0 ? 0.0f : fbaqValue(aCode >> 4, aId, false);
-            const float aQ = aCode < 0 ? 0.0f : fbaqValue(aCode & 15, aId, true);
-            ASSERT_EQ(beFloat(aRaw, at + 64 + 8 * s), aI) << "sample " << s;
-            ASSERT_EQ(beFloat(aRaw, at + 68 + 8 * s), aQ) << "sample " << s;
-        }
-    }
-
-    auto h = CDescriptionHeader::makeFull();
-    ASSERT_TRUE(h->read((aDir / "asar_raw").c_str(), true));
-    EXPECT_STREQ((*h)["Sensor.SensorName"].getString(), "ENVISAT-1");
-    EXPECT_STREQ((*h)["RasterInfo.CellType"].getString(), "FLOAT_COMPLEX");
-    EXPECT_STREQ((*h)["RasterInfo.BytesOrder"].getString(), "MSBF");
-    EXPECT_STREQ((*h)["Sensor.Chirp"].getString(), "UP_CHIRP");
-    EXPECT_EQ((*h)["RasterInfo.RowPrefix"].getInteger(), 64);
-    EXPECT_EQ((*h)["RasterInfo.RowSuffix"].getInteger(), 0);
-    EXPECT_EQ((*h)["RasterInfo.NrOfPixelsPerLine"].getInteger(), 135);
-    EXPECT_NEAR((*h)["ChannelInfo.PRF"].getDouble(0), kAsarFs / kAsarPri, 1e-9);
-    EXPECT_FALSE((*h)["ChannelInfo.PRFExtracted"].isInitialised()) << "the chain skips the PRF scan of ENVISAT-1";
-    std::string aOrigin;
-    EXPECT_FALSE(fqorvGetUserKey(*h, "ORIGIN DATA", aOrigin));
-    EXPECT_NEAR((*h)["Processing.FastTime"].getDouble(0), (6000 + 10.0 * kAsarPri) / kAsarFs - 1.2e-6, 1e-12);
-}
 
 TEST(NativeProducts, AlosRecordsKeepTheirBytesAndGetTheChainsCodes)
 {
